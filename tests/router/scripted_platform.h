@@ -1,0 +1,66 @@
+// The platform under the module as the tests want it: every call is recorded, with its arguments, in one list that the
+// answers are in too, and each can be told what to give back.
+#ifndef TESTS_ROUTER_SCRIPTED_PLATFORM_H
+#define TESTS_ROUTER_SCRIPTED_PLATFORM_H
+
+#include "platform/webapi.h"
+
+#include <json/value.h>
+
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace scripted {
+
+struct Platform {
+  std::vector<std::string> calls; ///< "Function(argument, argument)", in order
+  std::vector<std::string> log;   ///< messages at LOG_ERR without the line: "unit: message"
+
+  std::string topology = "router";
+  int topologyResult = 0;
+  std::string supportedMode = "router,bridge";
+  int supportedModeResult = 0;
+  bool supportsTopology = true;
+  bool hasDongle = false;
+  std::vector<std::string> existingFiles;
+  int checkKeyValueResult = 0;
+  int loadDataResult = 0;
+  Json::Value redirect;
+  bool serverReady = true;
+  int switchResult = 0;
+  int packageResult = 1;
+  Json::Value packages;
+  std::string language = "enu";
+};
+
+/// The platform of the test that runs. Replaced by a fresh one with Reset.
+Platform &Get();
+void Reset();
+
+/// One line of JSON.
+std::string Text(const Json::Value &value);
+
+/// Calls a handler as the framework would.
+class Exchange {
+public:
+  explicit Exchange(Json::Value parameters = Json::Value(Json::objectValue));
+  ~Exchange();
+  Exchange(const Exchange &) = delete;
+  Exchange &operator=(const Exchange &) = delete;
+
+  void Run(VORN::APIHandler handler);
+  /// Runs what the handler registered for after the answer.
+  void RunCallbacks();
+  /// "SetSuccess(...)" or "SetError(...)" of the last Run.
+  const std::string &Answer() const;
+  size_t AnswerCount() const;
+
+private:
+  struct Parts;
+  Parts *parts_;
+};
+
+} // namespace scripted
+
+#endif
