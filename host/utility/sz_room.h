@@ -1,0 +1,17 @@
+// How much room a new hash or list makes.
+#ifndef HOST_UTILITY_SZ_ROOM_H
+#define HOST_UTILITY_SZ_ROOM_H
+
+#include <algorithm>
+#include <cstddef>
+
+namespace vornhost {
+
+/// What a caller asks for is a hint; a wild number must not cost memory.
+constexpr size_t RoomFor(size_t asked) {
+  return std::min<size_t>(asked, 65536);
+}
+
+} // namespace vornhost
+
+#endif
