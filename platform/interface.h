@@ -42,6 +42,7 @@ public:
 
 protected:
   const std::string &GetName() const { return name_; }
+  void DropData(); ///< forgets the last reading
 
 private:
   std::string name_;

@@ -1,0 +1,110 @@
+#include "host/network/topology.h"
+
+#include "host/network/dhcp_client.h"
+#include "host/network/names.h"
+#include "host/network/network_state.h"
+#include "host/network/topology_config.h"
+#include "host/network/topology_lock.h"
+#include "host/network/topology_steps.h"
+#include "host/network/turn.h"
+#include "host/utility/log.h"
+
+#include <algorithm>
+#include <array>
+
+namespace vornhost {
+
+namespace {
+
+constexpr std::array<const char *, 2> kUplinks = {kWanPort, kOneBridge};
+constexpr std::array<const char *, 2> kBridges = {kLanBridge, kOneBridge};
+
+bool WasServed(const Snapshot &snapshot, const std::string &name) {
+  const auto &served = snapshot.dhcpInterfaces;
+  return std::find(served.begin(), served.end(), name) != served.end();
+}
+
+void ResumeDhcp(const Snapshot &snapshot, const std::string &name) {
+  const DhcpClient client(name);
+  const LinkState *link = snapshot.Find(name);
+  if (!client.IsRunning() && link != nullptr) {
+    client.Resume(link->FirstIpv4());
+  }
+}
+
+bool RestoreFromLock(Netlink &netlink, const TopologyLock &lock) {
+  const std::optional<Snapshot> snapshot = ParseSnapshot(lock.Read());
+  if (!snapshot) {
+    LogError("%s holds no snapshot: the network is made what its configuration says", kTopologyLock);
+    return ApplyConfiguration(netlink);
+  }
+  if (snapshot->boot != BootId()) {
+    LogError("a switch from %s to %s was cut off by a restart", snapshot->from.c_str(), snapshot->to.c_str());
+    return Attempt("restore", kWanConfig, [&snapshot] { RestoreWanFile(snapshot->wanFile); });
+  }
+  LogError("a switch from %s to %s died: going back to %s", snapshot->from.c_str(), snapshot->to.c_str(),
+           snapshot->from.c_str());
+  return RestoreSnapshot(netlink, *snapshot);
+}
+
+} // namespace
+
+// A client of a way out that was none comes first, so that it configures nothing any more; the clients that ran come
+// last, on links that are as they left them.
+bool RestoreSnapshot(Netlink &netlink, const Snapshot &snapshot) {
+  NetworkState state(netlink);
+  bool whole = true;
+  for (const std::string name : kUplinks) {
+    if (!WasServed(snapshot, name)) {
+      whole = Attempt("stop DHCP on", name, [&name] { DhcpClient(name).Stop(); }) && whole;
+    }
+  }
+  for (const std::string name : kBridges) {
+    if (snapshot.Find(name) == nullptr) {
+      whole = Attempt("remove", name, [&state, &name] { state.RemoveBridge(name); }) && whole;
+    }
+  }
+  for (const LinkState &link : snapshot.links) {
+    whole = Attempt("restore", link.link.name, [&state, &link] { state.Restore(link); }) && whole;
+  }
+  whole = Attempt("restore", kWanConfig, [&snapshot] { RestoreWanFile(snapshot.wanFile); }) && whole;
+  for (const std::string &name : snapshot.dhcpInterfaces) {
+    whole = Attempt("resume DHCP on", name, [&snapshot, &name] { ResumeDhcp(snapshot, name); }) && whole;
+  }
+  return whole;
+}
+
+Result RecoverStale(Netlink &netlink) {
+  TopologyLock lock;
+  switch (lock.TakeOver()) {
+  case TopologyLock::State::kAbsent:
+    return Result::kDone;
+  case TopologyLock::State::kHeld:
+    LogError("%s is held by a running switch: nothing is done", kTopologyLock);
+    return Result::kBusy;
+  case TopologyLock::State::kForeign:
+    LogError("%s is none of ours: it is neither followed nor removed, and no switch can be made", kTopologyLock);
+    return Result::kFailed;
+  case TopologyLock::State::kStale:
+    break;
+  }
+  if (!RestoreFromLock(netlink, lock)) {
+    LogError("the network could not be brought back whole: %s stays", kTopologyLock);
+    return Result::kFailed;
+  }
+  lock.Remove();
+  LogInfo("the network is brought back");
+  return Result::kDone;
+}
+
+Result Recover() {
+  const UniqueFd turn = TakeTurn();
+  if (!turn.IsOpen()) {
+    LogError("another process is changing the network: nothing is done");
+    return Result::kBusy;
+  }
+  Netlink netlink;
+  return RecoverStale(netlink);
+}
+
+} // namespace vornhost

@@ -1,0 +1,190 @@
+#include "host/network/topology.h"
+
+#include "host/network/dhcp_client.h"
+#include "host/network/names.h"
+#include "host/network/network_state.h"
+#include "host/network/topology_config.h"
+#include "host/network/topology_steps.h"
+#include "host/network/turn.h"
+#include "host/utility/log.h"
+#include "host/utility/program_runner.h"
+
+#include <sys/socket.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <fstream>
+#include <stdexcept>
+
+namespace vornhost {
+
+namespace {
+
+// A setting that this kernel does not have, or that may not be changed here, stays as it is.
+void WriteSetting(const std::string &path, const std::string &value) {
+  std::string now;
+  std::getline(std::ifstream(path), now);
+  if (!now.empty() && now != value) {
+    std::ofstream(path) << value;
+  }
+}
+
+bool HasIpv4(Netlink &netlink, int index) {
+  const std::vector<Address> addresses = netlink.Addresses();
+  return std::any_of(addresses.begin(), addresses.end(),
+                     [index](const Address &address) { return address.index == index && address.family == AF_INET; });
+}
+
+class Configurer {
+public:
+  Configurer(Netlink &netlink, const std::string &topology)
+      : netlink_(netlink), state_(netlink), topology_(topology), layout_(LayoutOf(topology)),
+        other_(layout_.bridge == kLanBridge ? kOneBridge : kLanBridge) {}
+
+  bool Run() {
+    const PortConfig lan = ReadPortConfig(kLanConfig);
+    const PortConfig guest = ReadPortConfig(kGuestConfig);
+    MakeBridge(layout_.bridge, layout_.wanInBridge ? WanMac() : lan.mac);
+    TakePorts(lan.ports);
+    PlaceWanPort();
+    Do("remove", other_, [this] { state_.RemoveBridge(other_); });
+    StartBridge(layout_.bridge, layout_.bridge == kLanBridge ? lan.address : "");
+    if (guest.present) {
+      MakeBridge(kGuestBridge, guest.mac);
+      AttachAll(guest.ports, kGuestBridge);
+      StartBridge(kGuestBridge, guest.address);
+    }
+    Connect();
+    return whole_;
+  }
+
+private:
+  void Do(const char *kind, const std::string &name, const Action &action) {
+    whole_ = Attempt(kind, name, action) && whole_;
+  }
+
+  std::string WanMac() {
+    const std::optional<Link> wan = netlink_.FindLink(kWanPort);
+    return wan ? wan->mac : "";
+  }
+
+  void MakeBridge(const std::string &name, const std::string &mac) {
+    Do("make", name, [&] { state_.EnsureBridge(name, mac); });
+  }
+
+  void AttachAll(const std::vector<std::string> &ports, const std::string &bridge) {
+    for (const std::string &port : ports) {
+      Do("attach", port, [&] { state_.Attach(port, bridge); });
+    }
+  }
+
+  // Besides the configured ports those that the other topology's bridge has, such as an access point's.
+  void TakePorts(std::vector<std::string> ports) {
+    for (const std::string &port : state_.PortsOf(other_)) {
+      if (port != kWanPort && std::find(ports.begin(), ports.end(), port) == ports.end()) {
+        ports.push_back(port);
+      }
+    }
+    AttachAll(ports, layout_.bridge);
+  }
+
+  void PlaceWanPort() {
+    Do("place", kWanPort, [this] {
+      if (!layout_.wanInBridge) {
+        state_.Detach(kWanPort);
+        return;
+      }
+      DhcpClient(kWanPort).Stop();
+      state_.Clear(kWanPort);
+      state_.Attach(kWanPort, layout_.bridge);
+    });
+  }
+
+  // After its ports are there: its link-local address is made of the MAC address that they give it.
+  void StartBridge(const std::string &name, const std::string &address) {
+    Do("start", name, [&] {
+      state_.SetUp(name);
+      if (!address.empty()) {
+        state_.AddAddress(name, address);
+      }
+    });
+  }
+
+  void Connect() {
+    const std::string unused = layout_.uplink == kWanPort ? kOneBridge : kWanPort;
+    Do("stop DHCP on", unused, [&unused] { DhcpClient(unused).Stop(); });
+    Do("connect", layout_.uplink, [this] {
+      if (!DhcpClient(layout_.uplink).IsRunning()) {
+        ConnectUplink(netlink_, topology_, false);
+      }
+    });
+  }
+
+  Netlink &netlink_;
+  NetworkState state_;
+  std::string topology_;
+  Layout layout_;
+  std::string other_;
+  bool whole_ = true;
+};
+
+void LetRouterForward() {
+  WriteSetting("/proc/sys/net/ipv4/ip_forward", "1");
+  WriteSetting("/proc/sys/net/ipv6/conf/all/forwarding", "1");
+}
+
+void LoadFirewall() {
+  if (ProgramRunner().Run({kNftProgram, "-f", kBaseFirewall}) != 0) {
+    throw std::runtime_error("nft did not take it");
+  }
+}
+
+} // namespace
+
+void LetBridgesForward() {
+  for (const char *family : {"iptables", "ip6tables", "arptables"}) {
+    WriteSetting(std::string("/proc/sys/net/bridge/bridge-nf-call-") + family, "0");
+  }
+}
+
+void ConnectUplink(Netlink &netlink, const std::string &topology, bool leaseNeeded) {
+  const std::string uplink = LayoutOf(topology).uplink;
+  const PortConfig config = topology == kBridgeTopology ? ReadOneBridgeConfig() : ReadPortConfig(kWanConfig);
+  NetworkState state(netlink);
+  // A host that forwards does not listen to router advertisements, unless told so (kernel: ip-sysctl, accept_ra).
+  WriteSetting("/proc/sys/net/ipv6/conf/" + uplink + "/accept_ra", "2");
+  if (config.dhcp) {
+    leaseNeeded ? DhcpClient(uplink).StartWithLease() : DhcpClient(uplink).Start();
+  } else if (!config.address.empty()) {
+    state.AddAddress(uplink, config.address);
+    if (!config.gateway.empty()) {
+      state.AddDefaultRoute(uplink, config.gateway);
+    }
+  }
+  if (leaseNeeded && !HasIpv4(netlink, state.Get(uplink).index)) {
+    throw std::runtime_error(uplink + " has no address");
+  }
+}
+
+bool ApplyConfiguration(Netlink &netlink) {
+  return Configurer(netlink, ConfiguredTopology()).Run();
+}
+
+// The firewall stands before the first packet can be forwarded.
+Result StartNetwork() {
+  const UniqueFd turn = TakeTurn();
+  if (!turn.IsOpen()) {
+    LogError("another process is changing the network: it is not brought up");
+    return Result::kBusy;
+  }
+  Netlink netlink;
+  RecoverStale(netlink); // a lock that is none of ours keeps nobody from having a network
+  bool whole = Attempt("load", kBaseFirewall, LoadFirewall);
+  LetBridgesForward();
+  LetRouterForward();
+  whole = ApplyConfiguration(netlink) && whole;
+  return whole ? Result::kDone : Result::kFailed;
+}
+
+} // namespace vornhost
