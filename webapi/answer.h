@@ -1,0 +1,48 @@
+// What the server sends, and the named answers that speak of the way to a handler. Nobody writes an error body by hand.
+#ifndef WEBAPI_ANSWER_H
+#define WEBAPI_ANSWER_H
+
+#include <string>
+
+namespace vornwebapi {
+
+struct Answer {
+  unsigned status = 200;
+  std::string body;
+  bool close = false; ///< the connection cannot be used after it
+  const char *allow = nullptr;
+  unsigned retryAfter = 0; ///< seconds; 0: not said
+};
+
+/// A handler's own answer.
+Answer Answered(std::string body);
+
+// Each has the body {"success":false,"error":{"code":<status>,"message":"..."}}, at most 200 bytes. `reason` is a
+// static text without characters that JSON escapes; no input is ever repeated in it.
+Answer BadRequest(const char *reason); ///< malformed HTTP: closes
+Answer BadBody(const char *reason);
+Answer NotFound();
+Answer MethodNotAllowed();
+Answer RequestTimeout();
+Answer BodyTooLarge();
+Answer TargetTooLong();
+Answer UnsupportedMediaType();
+Answer ExpectationFailed();
+Answer MisdirectedRequest();
+Answer HeaderTooLarge();
+Answer HandlerFailed();
+Answer UnknownMethod();
+Answer UnknownTransferCoding();
+Answer Busy();
+Answer Stopping();
+Answer TooManyConnections();
+Answer UnknownVersion();
+
+/// The bytes on the wire.
+/// @param[in] keepAlive  the client may go on using the connection
+/// @param[in] headOnly   without the body, as HEAD asks for
+std::string Render(const Answer &answer, bool keepAlive, bool headOnly);
+
+} // namespace vornwebapi
+
+#endif

@@ -1,0 +1,88 @@
+#include "webapi/service.h"
+
+#include "webapi/config.h"
+#include "webapi/handler_response.h"
+#include "webapi/log.h"
+#include "webapi/parameters.h"
+#include "webapi/text.h"
+
+#include <exception>
+#include <iterator>
+#include <sstream>
+
+namespace vornwebapi {
+namespace {
+
+/// @return false when the handler threw
+bool RunHandler(const Route &route, VORN::APIRequest &request, VORN::APIResponse &response) {
+  try {
+    route.row.handler(&request, &response);
+    return true;
+  } catch (const std::exception &error) {
+    Log(LogKind::kModuleFault, "%s threw: %s", route.name.c_str(), Printable(error.what()).c_str());
+  } catch (...) {
+    Log(LogKind::kModuleFault, "%s threw something that is no std::exception", route.name.c_str());
+  }
+  return false;
+}
+
+Answer AnswerOf(const Route &route, HandlerResponse &response) {
+  if (response.Answers() == 0) {
+    Log(LogKind::kModuleFault, "%s answered nothing", route.name.c_str());
+    return HandlerFailed();
+  }
+  if (response.Answers() > 1) {
+    Log(LogKind::kModuleFault, "%s answered %d times; the last counts", route.name.c_str(), response.Answers());
+  }
+  return Answered(response.TakeText());
+}
+
+/// The configuration's names and localhost, lower case.
+std::vector<std::string> ReadHostNames(const std::string &text) {
+  std::istringstream words(Lower(text) + " localhost");
+  return {std::istream_iterator<std::string>(words), std::istream_iterator<std::string>()};
+}
+
+} // namespace
+
+Service::Service(const Config &config, const std::vector<VORN::APIEntry> &rows)
+    : http_{config.requestLineBytes, config.headerBytes, config.headerFields, config.bodyBytes},
+      hostNames_(ReadHostNames(config.hostNames)), json_{config.jsonDepth, config.jsonValues},
+      tasks_({config.tasks, config.taskKeepTime}) {
+  for (const VORN::APIEntry &row : rows) {
+    const std::string version = std::to_string(row.version);
+    const std::string path = std::string("/webapi/") + row.api + '/' + version + '/' + row.method;
+    routes_.emplace(path, Route{row, std::string(row.api) + " v" + version + " " + row.method});
+  }
+}
+
+const Route *Service::Find(std::string_view path) const {
+  const auto found = routes_.find(path);
+  return found == routes_.end() ? nullptr : &found->second;
+}
+
+Outcome Service::Call(const Route &route, const Peer &peer, const RequestHead &head, const std::string &body) {
+  try {
+    VORN::APIRequest::State state;
+    if (const char *fault = ReadParameters(body, json_, state.parameters)) {
+      Log(LogKind::kRefusedRequest, "%s: %s", route.name.c_str(), fault);
+      return {BadBody(fault), {}};
+    }
+    state.user = peer.user;
+    state.language = head.language;
+    state.secure = peer.secure;
+    state.serverPort = peer.serverPort;
+    state.tasks = &tasks_;
+    HandlerResponse answered;
+    VORN::APIRequest request(state);
+    VORN::APIResponse response(answered);
+    const bool returned = RunHandler(route, request, response);
+    Answer answer = returned ? AnswerOf(route, answered) : HandlerFailed();
+    return {std::move(answer), answered.TakeCallbacks()};
+  } catch (const std::exception &error) { // no memory
+    Log(LogKind::kModuleFault, "%s: %s", route.name.c_str(), Printable(error.what()).c_str());
+    return {HandlerFailed(), {}};
+  }
+}
+
+} // namespace vornwebapi

@@ -1,0 +1,71 @@
+// What every connection serves: the loaded rows, and the call of one.
+#ifndef WEBAPI_SERVICE_H
+#define WEBAPI_SERVICE_H
+
+#include "webapi/answer.h"
+#include "webapi/callbacks.h"
+#include "webapi/json_scanner.h"
+#include "webapi/request_reader.h"
+#include "webapi/request_state.h"
+#include "webapi/task_registry.h"
+
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+namespace vornwebapi {
+
+struct Config;
+
+/// A row with its path and its name in log lines.
+struct Route {
+  VORN::APIEntry row;
+  std::string name;
+};
+
+/// What is known of a connection's two ends.
+struct Peer {
+  int serverPort = 0;
+  bool secure = false;
+  std::string user = "local"; ///< whom the call is made for
+};
+
+/// What came of a call.
+struct Outcome {
+  Answer answer;
+  Callbacks callbacks; ///< to be run when the answer was handed to the kernel, or could not be
+};
+
+/// Every member may be called from any thread; nothing changes after construction but the tasks.
+class Service {
+public:
+  Service(const Config &config, const std::vector<VORN::APIEntry> &rows);
+
+  const HttpLimits &Limits() const { return http_; }
+  const std::vector<std::string> &HostNames() const { return hostNames_; }
+  TaskRegistry &Tasks() { return tasks_; }
+
+  /// @param[in] path  the request's target, compared byte by byte
+  /// @return null when there is no such row
+  const Route *Find(std::string_view path) const;
+
+  /// Runs a row's handler. No exception leaves it.
+  Outcome Call(const Route &route, const Peer &peer, const RequestHead &head, const std::string &body);
+
+private:
+  struct Hash {
+    using is_transparent = void; // NOLINT(readability-identifier-naming): the standard library's name
+    size_t operator()(std::string_view text) const { return std::hash<std::string_view>()(text); }
+  };
+
+  HttpLimits http_;
+  std::vector<std::string> hostNames_; // lower case
+  JsonLimits json_;
+  TaskRegistry tasks_;
+  std::unordered_map<std::string, Route, Hash, std::equal_to<>> routes_;
+};
+
+} // namespace vornwebapi
+
+#endif

@@ -1,0 +1,70 @@
+#include "webapi/session.h"
+
+#include "webapi/log.h"
+
+#include <utility>
+
+namespace vornwebapi {
+
+Session::Session(Service &service, HostRule hosts, Peer peer)
+    : service_(service), hosts_(std::move(hosts)), peer_(std::move(peer)), reader_(service.Limits(), hosts_) {}
+
+Session::Wants Session::Step() {
+  state_ = reader_.Advance();
+  switch (state_) {
+  case RequestReader::State::kHead:
+    return Head();
+  case RequestReader::State::kDone:
+    if (reader_.Head().hasBody && !reader_.Body().empty() && !reader_.Head().json) {
+      return Refuse(UnsupportedMediaType());
+    }
+    return Wants::kCall;
+  case RequestReader::State::kFailed:
+    Log(LogKind::kRefusedRequest, "request refused with %u: %s", reader_.Fault().status, reader_.Fault().body.c_str());
+    return Refuse(reader_.Fault());
+  default:
+    return Wants::kBytes;
+  }
+}
+
+// What the header alone decides is answered before the body is taken.
+Session::Wants Session::Head() {
+  const RequestHead &head = reader_.Head();
+  route_ = service_.Find(head.target);
+  if (route_ == nullptr) {
+    return Refuse(NotFound());
+  }
+  if (head.method != "POST") {
+    return Refuse(MethodNotAllowed());
+  }
+  if (head.hasBody && !head.chunked && !head.json) {
+    return Refuse(UnsupportedMediaType());
+  }
+  const bool expects = head.expectsContinue && !reader_.HasBytes();
+  reader_.ReadBody();
+  return expects && reader_.Advance() == RequestReader::State::kBody ? Wants::kContinue : Step();
+}
+
+Session::Wants Session::Refuse(Answer answer) {
+  refusal_ = std::move(answer);
+  return Wants::kAnswer;
+}
+
+Outcome Session::Call() {
+  return service_.Call(*route_, peer_, reader_.Head(), reader_.Body());
+}
+
+std::string Session::Finish(const Answer &answer, bool stopping, bool &close) {
+  const RequestHead &head = reader_.Head();
+  // A request whose body was not read leaves the connection where no one can tell body from request.
+  const bool whole = state_ == RequestReader::State::kDone || (state_ == RequestReader::State::kHead && !head.hasBody);
+  close = answer.close || stopping || !whole || !head.keepAlive;
+  std::string text = Render(answer, !close, head.method == "HEAD");
+  if (!close) {
+    reader_.Next();
+    state_ = RequestReader::State::kIdle;
+  }
+  return text;
+}
+
+} // namespace vornwebapi
