@@ -4,7 +4,7 @@
 #
 # A package that brings a daemon would start it at once and at every boot; the machine wanted a program, not a server.
 # Starting is prevented with policy-rc.d (Debian's own switch for that; one that the machine already has is left to
-# decide), and the units of what was newly installed are disabled.
+# decide), and the services of what was newly installed are disabled.
 
 readonly VORN_PACKAGE_LIST="${BASH_SOURCE[0]%/*}/../packages"
 readonly VORN_START_POLICY=/usr/sbin/policy-rc.d
@@ -12,9 +12,12 @@ readonly VORN_START_POLICY=/usr/sbin/policy-rc.d
 packages_of() { # GROUP...
   local group
   for group in "$@"; do
-    grep -q "^$group " "$VORN_PACKAGE_LIST" || { echo "scripts/packages has no group \"$group\"" >&2; return 1; }
+    if ! grep -q "^$group " "$VORN_PACKAGE_LIST"; then
+      echo "scripts/packages has no group \"$group\"" >&2
+      return 1
+    fi
     sed -n "s/^$group \([^ ]*\).*/\1/p" "$VORN_PACKAGE_LIST"
-  done | sort -u
+  done
 }
 
 missing_of() { # PACKAGE...
@@ -28,13 +31,15 @@ apt_get() {
   DEBIAN_FRONTEND=noninteractive apt-get -o DPkg::Lock::Timeout=300 -o Acquire::Retries=3 -y -q "$@"
 }
 
-disable_units_of() { # PACKAGE...
+# Both kinds of start at boot: init scripts, and units where there is systemd.
+disable_services_of() { # PACKAGE...
+  local name
+  for name in $(dpkg-query -L "$@" | sed -n 's,^/etc/init\.d/,,p'); do
+    update-rc.d "$name" disable 2>/dev/null || true
+  done
   command -v systemctl >/dev/null || return 0
-  local package unit
-  for package in "$@"; do
-    for unit in $(dpkg-query -L "$package" | sed -n 's,^\(/usr\)\?/lib/systemd/system/\([^/@]*\.\(service\|socket\)\)$,\2,p'); do
-      systemctl disable --quiet "$unit" 2>/dev/null || true
-    done
+  for name in $(dpkg-query -L "$@" | sed -n 's,^\(/usr\)\?/lib/systemd/system/\([^/@]*\.\(service\|socket\)\)$,\2,p'); do
+    systemctl disable --quiet "$name" 2>/dev/null || true
   done
 }
 
@@ -53,12 +58,12 @@ install_packages() { # GROUP...
   local listed missing
   listed=$(packages_of "$@") || return 1
   # shellcheck disable=SC2086  # package names are words
-  mapfile -t missing < <(missing_of $listed)
+  mapfile -t missing < <(missing_of $listed | sort -u)
   [ "${#missing[@]}" -gt 0 ] || return 0
   if [ "$(id -u)" != 0 ]; then
     echo "missing packages, and only root can install them: ${missing[*]}" >&2
     return 1
   fi
   echo "installing: ${missing[*]}" >&2
-  apt_get update >&2 && install_without_starting "${missing[@]}" >&2 && disable_units_of "${missing[@]}"
+  apt_get update >&2 && install_without_starting "${missing[@]}" >&2 && disable_services_of "${missing[@]}" >&2
 }
