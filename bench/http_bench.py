@@ -1,0 +1,204 @@
+#!/usr/bin/python3
+"""http_bench.py BUILD_FOLDER [ROUNDS]: the server with the router's module against nginx and against a constant answer.
+
+Runs under private_view: server, yardstick and load generator share one network namespace with nothing else in it. Targets are
+measured in turn, round after round, so that what disturbs the machine disturbs them alike; the medians are compared.
+"""
+import glob
+import json
+import os
+import re
+import socket
+import statistics
+import subprocess
+import sys
+import tempfile
+import time
+import urllib.request
+
+BUILD = os.path.abspath(sys.argv[1])
+ROUNDS = int(sys.argv[2]) if len(sys.argv) > 2 else 5
+SECONDS = 2
+CONNECTIONS = (1, 8, 64)
+TOPOLOGY = "/webapi/VORN.Core.Network.Router.Topology/2/get"
+CONSTANT = "/webapi/VORN.Bench.Constant/1/get"
+
+LIMITS = {  # what the figures are held against
+    "share of nginx's requests at 64 connections": 0.3,
+    "times nginx's p99 at 64 connections": 3.0,
+    "idle private memory, MB": 10.0,
+    "start to first answer, ms": 100.0,
+    "router.so stripped, kB": 300.0,
+}
+
+
+def run(*command):
+    subprocess.run(command, check=True, stdout=subprocess.DEVNULL)
+
+
+def make_home():
+    """The two interfaces and the file that the topology is read from."""
+    run("ip", "link", "add", "eth0", "type", "veth", "peer", "name", "isp0")
+    run("ip", "link", "add", "lbr0", "type", "bridge")
+    for name in ("eth0", "isp0", "lbr0"):
+        run("ip", "link", "set", name, "up")
+    run("ip", "addr", "add", "192.168.1.1/24", "dev", "lbr0")
+    folder = "/etc/sysconfig/network-scripts"
+    os.makedirs(folder, exist_ok=True)
+    for name, text in {"eth0": "DEVICE=eth0\nBOOTPROTO=dhcp\nSLAVE=no\n",
+                       "lbr0": "DEVICE=lbr0\nTYPE=Bridge\nIPADDR=192.168.1.1\nNETMASK=255.255.255.0\n"}.items():
+        with open(f"{folder}/ifcfg-{name}", "w", encoding="ascii") as file:
+            file.write(text)
+
+
+def wait_for(port):
+    for _ in range(2000):
+        with socket.socket() as probe:
+            if probe.connect_ex(("127.0.0.1", port)) == 0:
+                return
+        time.sleep(0.001)
+    raise SystemExit(f"nothing listens on port {port}")
+
+
+def post(port, path):
+    request = urllib.request.Request(f"http://127.0.0.1:{port}{path}", data=b"", method="POST")
+    with urllib.request.urlopen(request, timeout=5) as answer:
+        return answer.read()
+
+
+def start_server(port, module):
+    server = subprocess.Popen([f"{BUILD}/webapi/vornwebd", "--module", module, "--listen", f"127.0.0.1:{port}"])
+    wait_for(port)
+    return server
+
+
+def start_nginx(port, body, folder):
+    os.makedirs(f"{folder}/root", exist_ok=True)
+    with open(f"{folder}/root/answer.json", "wb") as file:
+        file.write(body)
+    with open(f"{folder}/nginx.conf", "w", encoding="ascii") as file:
+        file.write(f"""worker_processes 2; pid {folder}/pid; error_log {folder}/error.log; daemon off; user root;
+events {{ worker_connections 1024; }}
+http {{ access_log off; keepalive_requests 1000000000; default_type application/json; sendfile on; tcp_nodelay on;
+  client_body_temp_path {folder}/b; proxy_temp_path {folder}/p; fastcgi_temp_path {folder}/f; uwsgi_temp_path {folder}/u;
+  scgi_temp_path {folder}/s; open_file_cache max=10;
+  server {{ listen 127.0.0.1:{port}; root {folder}/root; }} }}
+""")
+    yardstick = subprocess.Popen(["/usr/sbin/nginx", "-c", f"{folder}/nginx.conf", "-e", f"{folder}/error.log"])
+    wait_for(port)
+    return yardstick
+
+
+def load(port, method, path, connections):
+    """One run of wrk: requests per second and p99 in microseconds."""
+    script = f'wrk.method="{method}"\nfunction done(s, l, r)\n io.write(string.format("RESULT %f %d %d\\n",' \
+             " s.requests / (s.duration / 1e6), l:percentile(99), s.errors.status + s.errors.read + s.errors.timeout))\nend\n"
+    with tempfile.NamedTemporaryFile("w", suffix=".lua") as lua:
+        lua.write(script)
+        lua.flush()
+        out = subprocess.run(["wrk", "-t1", f"-c{connections}", f"-d{SECONDS}s", "-s", lua.name,
+                              f"http://127.0.0.1:{port}{path}"], check=True, capture_output=True, text=True).stdout
+    rate, p99, errors = re.search(r"RESULT (\S+) (\d+) (\d+)", out).groups()
+    if int(errors) != 0:
+        raise SystemExit(f"{errors} failed requests at {path}")
+    return float(rate), int(p99)
+
+
+
+
+def cores_used(server):
+    """Seen on which cores, sampled while 8 connections are served."""
+    wrk = subprocess.Popen(["wrk", "-t1", "-c8", "-d2s", "-s", "/dev/stdin", f"http://127.0.0.1:8081{TOPOLOGY}"],
+                           stdin=subprocess.PIPE, stdout=subprocess.DEVNULL, text=True)
+    wrk.stdin.write('wrk.method="POST"\n')
+    wrk.stdin.close()
+    seen = {}
+    for _ in range(100):
+        time.sleep(0.015)
+        for stat in glob.glob(f"/proc/{server.pid}/task/*/stat"):
+            with open(stat, encoding="ascii") as file:
+                fields = file.read().rsplit(")", 1)[1].split()
+            if fields[0] == "R":
+                seen[int(fields[36])] = seen.get(int(fields[36]), 0) + 1
+    wrk.wait()
+    return seen
+
+
+def private_megabytes(pid):
+    with open(f"/proc/{pid}/smaps_rollup", encoding="ascii") as file:
+        return sum(int(line.split()[1]) for line in file if line.startswith("Private_")) / 1024
+
+
+def first_answer():
+    """Milliseconds from the start of the process to the end of its first answer; median of nine."""
+    times = []
+    for _ in range(9):
+        begin = time.monotonic()
+        server = start_server(8090, f"{BUILD}/router/router.so")
+        post(8090, TOPOLOGY)
+        times.append((time.monotonic() - begin) * 1000)
+        server.terminate()
+        server.wait()
+    return statistics.median(times)
+
+
+def stripped_size():
+    with tempfile.NamedTemporaryFile() as out:
+        run("strip", "-o", out.name, f"{BUILD}/router/router.so")
+        return os.path.getsize(out.name) / 1000
+
+
+def measure(targets):
+    results = {(name, c): [] for name in targets for c in CONNECTIONS}
+    for name, (port, method, path) in targets.items():
+        load(port, method, path, 8)  # warm
+    for _ in range(ROUNDS):
+        for connections in CONNECTIONS:
+            for name, (port, method, path) in targets.items():
+                results[name, connections].append(load(port, method, path, connections))
+    return {key: (statistics.median(r for r, _ in rows), statistics.median(p for _, p in rows))
+            for key, rows in results.items()}
+
+
+def main():
+    make_home()
+    with tempfile.TemporaryDirectory() as folder:
+        figures = {"start to first answer, ms": first_answer(), "router.so stripped, kB": stripped_size()}
+        server = start_server(8081, f"{BUILD}/router/router.so")
+        answer = post(8081, TOPOLOGY)
+        if json.loads(answer)["data"]["net_topology"] != "router":
+            raise SystemExit(f"unexpected answer: {answer}")
+        figures["idle private memory, MB"] = private_megabytes(server.pid)
+        constant = start_server(8082, f"{BUILD}/bench/bench_constant.so")
+        nginx = start_nginx(8083, answer, folder)
+        medians = measure({"nginx, static file": (8083, "GET", "/answer.json"),
+                           "vornwebd, constant": (8082, "POST", CONSTANT),
+                           "vornwebd, Topology v2 get": (8081, "POST", TOPOLOGY)})
+        cores = cores_used(server)
+        for process in (server, constant, nginx):
+            process.terminate()
+            process.wait()
+    report(answer, medians, cores, figures)
+
+
+def report(answer, medians, cores, figures):
+    print(f"answer of {len(answer)} bytes, medians of {ROUNDS} rounds of {SECONDS} s taken in turn, {os.cpu_count()} cores\n")
+    print(f"{'':28}" + "".join(f"{c:>10} conn. req/s, p99" for c in CONNECTIONS))
+    for name in dict.fromkeys(n for n, _ in medians):
+        print(f"{name:28}" + "".join(f"{medians[name, c][0]:>16.0f} {medians[name, c][1]:>8.0f} us" for c in CONNECTIONS))
+    ours, theirs = medians["vornwebd, Topology v2 get", 64], medians["nginx, static file", 64]
+    figures["share of nginx's requests at 64 connections"] = ours[0] / theirs[0]
+    figures["times nginx's p99 at 64 connections"] = ours[1] / theirs[1]
+    print()
+    failed = False
+    for name, limit in LIMITS.items():
+        wanted = figures[name] >= limit if name.startswith("share") else figures[name] <= limit
+        failed = failed or not wanted
+        print(f"{name:48}{figures[name]:>10.2f}   {'at least' if name.startswith('share') else 'at most'} {limit:g}"
+              f"   {'kept' if wanted else 'MISSED'}")
+    both = len(cores) >= min(2, os.cpu_count())
+    print(f"{'cores seen serving 8 connections (samples)':48}{str(cores):>10}   {'kept' if both else 'MISSED'}")
+    sys.exit(1 if failed or not both else 0)
+
+
+main()
