@@ -46,7 +46,7 @@ void DhcpClient::Run(const std::vector<std::string> &options) const {
   arguments.insert(arguments.end(), options.begin(), options.end());
   RunLimits limits;
   limits.time = std::chrono::seconds(15);
-  mkdir(kRunFolder, 0755);
+  mkdir(kRunFolder, 0700);
   if (ProgramRunner(limits).Run(arguments) != 0) {
     Stop(); // one that was cut off at the limit may have left a child
     throw std::runtime_error("no DHCP lease on " + interface_);
@@ -70,7 +70,7 @@ void DhcpClient::Resume(const std::string &address) const {
     Start();
     return;
   }
-  mkdir(kRunFolder, 0755);
+  mkdir(kRunFolder, 0700);
   const UniqueFd keep(open(KeepFile().c_str(), O_CREAT | O_WRONLY | O_CLOEXEC | O_NOFOLLOW, 0644));
   Run({"-b", "-t", "1", "-T", "1", "-A", "5", "-r", address});
 }

@@ -69,7 +69,7 @@ TopologyLock::State TopologyLock::TakeOver() {
 
 bool TopologyLock::Make(const std::string &content) {
   const std::string folder(kTopologyLock, std::string(kTopologyLock).rfind('/'));
-  UniqueFd file(open(folder.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0644));
+  UniqueFd file(open(folder.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
   if (!file.IsOpen()) {
     Fail("creating");
   }

@@ -218,7 +218,9 @@ std::string SnapshotText(const Snapshot &snapshot) {
     out["dhcp"].append(name);
   }
   out["wan_file"] = snapshot.wanFile ? Json::Value(*snapshot.wanFile) : Json::Value();
-  return Json::writeString(Json::StreamWriterBuilder(), out);
+  Json::StreamWriterBuilder builder;
+  builder["emitUTF8"] = true; // texts of files as they are: the default reads and changes what is no UTF-8
+  return Json::writeString(builder, out);
 }
 
 std::optional<Snapshot> ParseSnapshot(const std::string &text) {

@@ -130,8 +130,14 @@ private:
 };
 
 void LetRouterForward() {
-  WriteSetting("/proc/sys/net/ipv4/ip_forward", "1");
-  WriteSetting("/proc/sys/net/ipv6/conf/all/forwarding", "1");
+  const std::string ipv4 = "/proc/sys/net/ipv4/ip_forward";
+  WriteSetting(ipv4, "1");
+  WriteSetting("/proc/sys/net/ipv6/conf/all/forwarding", "1"); // absent where IPv6 is off
+  std::string now;
+  std::getline(std::ifstream(ipv4), now);
+  if (now != "1") {
+    throw std::runtime_error("the kernel did not take it");
+  }
 }
 
 void LoadFirewall() {
@@ -171,7 +177,8 @@ bool ApplyConfiguration(Netlink &netlink) {
   return Configurer(netlink, ConfiguredTopology()).Run();
 }
 
-// The firewall stands before the first packet can be forwarded.
+// The firewall stands before the first packet can be forwarded; without it none is. The home network and the router
+// itself come up all the same.
 Result StartNetwork() {
   const UniqueFd turn = TakeTurn();
   if (!turn.IsOpen()) {
@@ -182,7 +189,10 @@ Result StartNetwork() {
   RecoverStale(netlink); // a lock that is none of ours keeps nobody from having a network
   bool whole = Attempt("load", kBaseFirewall, LoadFirewall);
   LetBridgesForward();
-  LetRouterForward();
+  whole = whole && Attempt("start", "forwarding", LetRouterForward);
+  if (ConfiguredTopology() == std::string(kClientTopology)) {
+    LogError("%s asks for \"client\", which this router cannot be: it comes up as \"router\"", kWanConfig);
+  }
   whole = ApplyConfiguration(netlink) && whole;
   return whole ? Result::kDone : Result::kFailed;
 }

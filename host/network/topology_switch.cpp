@@ -8,6 +8,7 @@
 #include "host/network/topology_lock.h"
 #include "host/network/topology_steps.h"
 #include "host/network/turn.h"
+#include "host/utility/atomic_file.h"
 #include "host/utility/log.h"
 
 #include <algorithm>
@@ -164,6 +165,19 @@ const char *WhyNot(const std::string &target) {
   return "no upstream network is configured";
 }
 
+// What a switch that is killed leaves behind is put back from its snapshot, so that one which could not be read back
+// must not be the ground of a switch.
+// @return why the snapshot cannot be relied on; null when it can
+const char *WhyNotKept(const Snapshot &snapshot) {
+  if (snapshot.Find(kWanPort) == nullptr || snapshot.Find(LayoutOf(snapshot.from).bridge) == nullptr) {
+    return "an interface has just gone";
+  }
+  const std::string text = SnapshotText(snapshot);
+  const auto back = ParseSnapshot(text);
+  return text.size() <= kFileLimit && back && SnapshotText(*back) == text ? nullptr
+                                                                          : "the network's state cannot be kept";
+}
+
 Result CarryOut(Netlink &netlink, const Snapshot &snapshot, TopologyLock &lock) {
   LetBridgesForward();
   SwitchPlan plan(netlink, snapshot);
@@ -216,12 +230,19 @@ Result SwitchTopology(const std::string &target) {
     return Refuse(target, "the network is in no topology that could be left");
   }
   if (target == current) {
+    if (target != ConfiguredTopology()) { // else the next start would leave it
+      const Layout layout = LayoutOf(target);
+      WriteWanBridge(layout.wanInBridge ? layout.bridge : "");
+    }
     return Result::kDone;
   }
   if (const char *reason = WhyNot(target); reason != nullptr) {
     return Refuse(target, reason);
   }
   const Snapshot snapshot = TakeSnapshot(netlink, current, target);
+  if (const char *reason = WhyNotKept(snapshot); reason != nullptr) {
+    return Refuse(target, reason);
+  }
   TopologyLock lock;
   if (!lock.Make(SnapshotText(snapshot))) {
     Refuse(target, "the lock file has come into being");

@@ -5,24 +5,42 @@
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstring>
 #include <stdexcept>
 #include <string>
+#include <thread>
 
 namespace vornhost {
 
+namespace {
+
+// A switch is refused while another is under way, but not for the moment that a look at the network takes.
+constexpr std::chrono::milliseconds kPatience{2000};
+constexpr std::chrono::milliseconds kPause{20};
+
+} // namespace
+
 UniqueFd TakeTurn() {
-  mkdir(kRunFolder, 0755);
+  mkdir(kRunFolder, 0700); // whoever could open it could hold every change up
   UniqueFd folder(open(kRunFolder, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-  if (folder.IsOpen() && flock(folder.Get(), LOCK_EX | LOCK_NB) == 0) {
-    return folder;
+  const auto end = std::chrono::steady_clock::now() + kPatience;
+  while (folder.IsOpen()) {
+    if (flock(folder.Get(), LOCK_EX | LOCK_NB) == 0) {
+      return folder;
+    }
+    if (errno != EWOULDBLOCK) {
+      break;
+    }
+    if (access(kTopologyLock, F_OK) == 0 || std::chrono::steady_clock::now() > end) {
+      return {};
+    }
+    std::this_thread::sleep_for(kPause);
   }
-  if (errno != EWOULDBLOCK) {
-    throw std::runtime_error(std::string(kRunFolder) + ": " + std::strerror(errno));
-  }
-  return {};
+  throw std::runtime_error(std::string(kRunFolder) + ": " + std::strerror(errno));
 }
 
 } // namespace vornhost

@@ -9,6 +9,9 @@
 namespace {
 
 int Run(std::vector<std::string> words, const std::vector<const char *> &arguments) {
+  if (words.empty()) { // else the first argument would be taken for the program
+    return vornhost::SetError(QARDC_ERR_BAD_ARGUMENT);
+  }
   words.insert(words.end(), arguments.begin(), arguments.end());
   return vornhost::ProgramRunner().Run(words);
 }

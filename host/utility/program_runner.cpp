@@ -220,7 +220,10 @@ bool WaitForEnd(const Child &child, int pipe, milliseconds limit, OutputLog &log
   }
 }
 
-int Judge(const std::string &program, int status) {
+int Judge(const std::string &program, int status, int *exitStatus) {
+  if (exitStatus != nullptr && WIFEXITED(status)) {
+    *exitStatus = WEXITSTATUS(status);
+  }
   if (WIFEXITED(status) && WEXITSTATUS(status) == 0) {
     return 0;
   }
@@ -232,7 +235,10 @@ int Judge(const std::string &program, int status) {
 
 } // namespace
 
-int ProgramRunner::Run(const std::vector<std::string> &arguments) const {
+int ProgramRunner::Run(const std::vector<std::string> &arguments, int *status) const {
+  if (status != nullptr) {
+    *status = -1;
+  }
   std::string path;
   if (arguments.empty()) {
     return SetError(QARDC_ERR_BAD_ARGUMENT);
@@ -255,8 +261,8 @@ int ProgramRunner::Run(const std::vector<std::string> &arguments) const {
     child.Kill();
   }
   log.Finish();
-  int status = 0;
-  if (!child.Reap(status)) {
+  int waitStatus = 0;
+  if (!child.Reap(waitStatus)) {
     return SetErrno(errno);
   }
   if (!inTime) {
@@ -264,7 +270,7 @@ int ProgramRunner::Run(const std::vector<std::string> &arguments) const {
              static_cast<long long>(limits_.time.count()));
     return SetError(QARDC_ERR_TIMEOUT);
   }
-  return Judge(program, status);
+  return Judge(program, waitStatus, status);
 }
 
 std::vector<std::string> SplitWords(const std::string &text) {

@@ -29,9 +29,10 @@ public:
 
   /// Runs a program and waits for its end.
   /// @param[in] arguments  the program's absolute path, then its arguments
+  /// @param[out] status    the status with which it ended by itself; -1 when it did not. Null: not wanted
   /// @retval 0   it ended with status 0
-  /// @retval <0  with the error set and the cause in the system log
-  int Run(const std::vector<std::string> &arguments) const;
+  /// @retval <0  with the error set; the cause is in the system log where the program is to blame
+  int Run(const std::vector<std::string> &arguments, int *status = nullptr) const;
 
 private:
   RunLimits limits_;

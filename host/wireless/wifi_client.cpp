@@ -4,9 +4,11 @@ namespace vornwireless::dbus {
 class VORN_EXPORT WifiClient;
 }
 
+#include "platform/utility.h"
 #include "platform/wifi.h"
 
 #include "host/network/names.h"
+#include "host/network/topology.h"
 #include "host/utility/error.h"
 #include "host/utility/log.h"
 #include "host/utility/program_runner.h"
@@ -21,14 +23,20 @@ bool IsTopology(const std::string &text) {
   return text == vornhost::kRouterTopology || text == vornhost::kBridgeTopology || text == vornhost::kClientTopology;
 }
 
-// The switch is a program of its own, so that it is carried through, or undone, also when this process dies. When the
-// program itself died, what it left is set right; when it ended in order, there is nothing for "recover" to do.
+// A switch that was refused has left nothing, and one that is under way is not ours to disturb. What is set right is
+// what a switch that died, or that could not be undone, has left with its lock.
+bool NeedsRecovery(int status) {
+  return status != static_cast<int>(vornhost::Result::kBusy) && QARDCFileExist(vornhost::kTopologyLock) != 0;
+}
+
+// The switch is a program of its own, so that it is carried through, or undone, also when this process dies.
 int RunSwitch(const std::string &target) {
   const vornhost::ProgramRunner runner;
-  if (runner.Run({vornhost::kTopologyProgram, "switch", target}) == 0) {
+  int status = -1;
+  if (runner.Run({vornhost::kTopologyProgram, "switch", target}, &status) == 0) {
     return 0;
   }
-  if (runner.Run({vornhost::kTopologyProgram, "recover"}) != 0) {
+  if (NeedsRecovery(status) && runner.Run({vornhost::kTopologyProgram, "recover"}) != 0) {
     vornhost::LogError("the network may be half switched: \"%s recover\" failed", vornhost::kTopologyProgram);
   }
   return vornhost::SetError(QARDC_ERR_EXEC);

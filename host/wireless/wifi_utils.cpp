@@ -51,10 +51,8 @@ VORN_EXPORT int GetTopologyString(std::string &topology) {
 
 VORN_EXPORT int GetSupportedMode(std::string &mode) {
   return vornhost::Guarded(-1, [&mode] {
+    // What the switch can do: it joins no wireless network, so that "client" is not offered.
     mode = std::string(vornhost::kRouterTopology) + "," + vornhost::kBridgeTopology;
-    if (AnyAdapter([](const fs::path &) { return true; })) {
-      mode += std::string(",") + vornhost::kClientTopology;
-    }
     return 0;
   });
 }

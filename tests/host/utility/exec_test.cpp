@@ -144,6 +144,8 @@ TEST_F(Exec, WhatIsNoProgramIsNotRun) {
   EXPECT_TRUE(FailedWith(run(nullptr), QARDC_ERR_BAD_ARGUMENT));
   EXPECT_TRUE(FailedWith(run(""), QARDC_ERR_BAD_ARGUMENT));
   EXPECT_TRUE(FailedWith(run("  "), QARDC_ERR_BAD_ARGUMENT));
+  EXPECT_TRUE(FailedWith(QARDCExec("", "/bin/true", nullptr, nullptr, nullptr), QARDC_ERR_BAD_ARGUMENT));
+  EXPECT_TRUE(FailedWith(QARDCExecl(" ", 187, "/bin/true", nullptr), QARDC_ERR_BAD_ARGUMENT));
   EXPECT_TRUE(FailedWith(run("true"), QARDC_ERR_BAD_ARGUMENT));
   EXPECT_TRUE(FailedWith(run("./true"), QARDC_ERR_BAD_ARGUMENT));
   EXPECT_TRUE(FailedWith(QARDCExecl(nullptr, 187, nullptr), QARDC_ERR_BAD_ARGUMENT));
