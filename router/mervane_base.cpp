@@ -3,7 +3,9 @@
 #include "platform/interface.h"
 #include "platform/packageserver.h"
 #include "platform/utility.h"
+#include "router/log.h"
 #include "router/parameters.h"
+#include "router/portforward.h"
 #include "router/topology.h"
 
 #include <memory>
@@ -49,6 +51,7 @@ VORN::APIEntry *GetAPITable() {
 
 namespace {
 
+constexpr char kUnit[] = "mervane_base";
 constexpr char kTopologyLock[] = "/tmp/topology.lock";
 
 void AnswerTopology(APIResponse *response, int version) {
@@ -58,6 +61,17 @@ void AnswerTopology(APIResponse *response, int version) {
     response->SetSuccess(result);
   } else {
     response->SetError(kErrorFailed, Json::Value());
+  }
+}
+
+// The getters that answer a failure with what they have so far.
+void AnswerPortForward(APIResponse *response, bool (PortForward::*get)(Json::Value &)) {
+  Json::Value result;
+  PortForward portForward;
+  if ((portForward.*get)(result)) {
+    response->SetSuccess(result);
+  } else {
+    response->SetError(kErrorFailed, result);
   }
 }
 
@@ -128,19 +142,50 @@ void GetConnectionListCount(APIRequest *, APIResponse *response) {
 }
 
 void GetPortForward(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+  AnswerPortForward(response, &PortForward::GetPortForward);
 }
 
-void SetPortForward(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetPortForward(APIRequest *request, APIResponse *response) {
+  Json::Value parameters(Json::objectValue);
+  PortForward portForward;
+  if (request->HasParam("rules")) {
+    Json::Value &rules = parameters["rules"];
+    std::string errors;
+    if (!router::ParseJsonText(request->GetParam("rules", Json::Value()), rules, errors)) {
+      ROUTER_LOG("%s:%d Error when parsing array, msg: %s", errors.c_str());
+      response->SetError(kErrorFailed, Json::Value());
+      return;
+    }
+    if (!rules.isArray()) {
+      ROUTER_LOG("%s:%d Data rules from req is not an json array");
+      response->SetError(kErrorFailed, rules);
+      return;
+    }
+  }
+  if (portForward.SetPortForward(parameters)) {
+    response->SetSuccess(Json::Value());
+  } else {
+    response->SetError(kErrorFailed, parameters["rules"]);
+  }
 }
 
 void GetDMZ(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+  AnswerPortForward(response, &PortForward::GetDMZ);
 }
 
-void SetDMZ(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetDMZ(APIRequest *request, APIResponse *response) {
+  Json::Value parameters(Json::objectValue);
+  PortForward portForward;
+  for (const char *name : {"enable", "ip"}) {
+    if (request->HasParam(name)) {
+      parameters[name] = request->GetParam(name, Json::Value());
+    }
+  }
+  if (portForward.SetDMZ(parameters)) {
+    response->SetSuccess(Json::Value());
+  } else {
+    response->SetError(kErrorFailed, parameters);
+  }
 }
 
 void GetParentalControl(APIRequest *, APIResponse *response) {
@@ -160,7 +205,7 @@ void SetMacFilter(APIRequest *, APIResponse *response) {
 }
 
 void GetLocalLan(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+  AnswerPortForward(response, &PortForward::GetLocalLan);
 }
 
 void GetGatewayList(APIRequest *, APIResponse *response) {

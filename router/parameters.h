@@ -20,8 +20,34 @@ enum ErrorCode {
 /// @return the value's text, untouched; nothing when it is no text
 std::optional<std::string> TextOf(const Json::Value &value);
 
+/// For a text that goes into a C function.
+/// @return the value's text; nothing when it is no text, or holds a NUL, at which it would be cut
+std::optional<std::string> WholeTextOf(const Json::Value &value);
+
+/// JsonCpp's conversion to a text: numbers, booleans and null have one too.
+/// @return nothing for an array or an object
+std::optional<std::string> ConvertToText(const Json::Value &value);
+
+/// JsonCpp's conversion to a truth value: numbers and null have one too.
+/// @return nothing for a text, an array or an object
+std::optional<bool> ConvertToBool(const Json::Value &value);
+
+/// @return the member of that name; null when there is none or the value is no object
+const Json::Value &MemberOf(const Json::Value &value, const char *name);
+
 /// @return the parameter's text, untouched; nothing when the request lacks it or its value is no text
 std::optional<std::string> TextParameter(const VORN::APIRequest &request, const std::string &name);
+
+/// Reads JSON that came inside a text. Arrays and objects may be nested 64 deep, as in a request's body: the reader
+/// recurses and takes no limit that would fit a small stack.
+/// @param[out] value   what the text says
+/// @param[out] errors  what the reader says is wrong with it, at most 1 KiB of it
+/// @return false when the text is no JSON
+bool ParseJson(const std::string &text, Json::Value &value, std::string &errors);
+
+/// The same for a parameter that holds an array as text; a number, boolean or null is taken for its text.
+/// @return false when the value has no text, or the text is no JSON; any JSON value makes it true
+bool ParseJsonText(const Json::Value &parameter, Json::Value &value, std::string &errors);
 
 } // namespace router
 

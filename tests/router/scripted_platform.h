@@ -7,11 +7,26 @@
 
 #include <json/value.h>
 
+#include <map>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
 
 namespace scripted {
+
+using Pairs = std::vector<std::pair<std::string, std::string>>;
+
+struct Lan {
+  std::string name;
+  std::string ip;
+  std::string mask;
+};
+
+struct RuleRecord {
+  std::string name;
+  Pairs pairs;
+};
 
 struct Platform {
   std::vector<std::string> calls; ///< "Function(argument, argument)", in order
@@ -32,11 +47,24 @@ struct Platform {
   int packageResult = 1;
   Json::Value packages;
   std::string language = "enu";
+
+  std::map<std::string, int> results;           ///< what a call, as recorded, gives back instead of success
+  std::set<std::string> folders;                ///< those that exist; QARDCExec of mkdir makes none
+  std::map<std::string, std::string> keyValues; ///< "path key" -> value
+  std::vector<Lan> lans;
+  std::map<std::string, std::set<std::string>> subnets; ///< interface address -> the addresses in its subnet
+  std::vector<RuleRecord> ruleFile;
+  int hashes = 0; ///< made so far; the first one is "hash 0"
+  int liveHashes = 0;
 };
 
 /// The platform of the test that runs. Replaced by a fresh one with Reset.
 Platform &Get();
 void Reset();
+
+/// Records a call.
+/// @return what Platform::results says for it, or `normal`
+int Call(const std::string &call, int normal = 0);
 
 /// One line of JSON.
 std::string Text(const Json::Value &value);
