@@ -3,6 +3,7 @@
 // or undone, whatever happens to the process that asked for it.
 #include "host/network/topology.h"
 #include "host/utility/log.h"
+#include "host/utility/program_runner.h"
 
 #include <syslog.h>
 #include <unistd.h>
@@ -25,18 +26,27 @@ void IgnoreSignals() {
   }
 }
 
+// Port forwards are judged by the LAN's addresses, which may be others now. What it says is in the system log.
+Result WithForwards(Result result) {
+  constexpr char kNetworkScript[] = "/etc/rc.network";
+  if (access(kNetworkScript, X_OK) == 0) {
+    vornhost::ProgramRunner().Run({kNetworkScript, "start-dnat"});
+  }
+  return result;
+}
+
 Result Run(const std::string &command, int argc, char **argv) {
   if (command == "switch" && argc == 3) {
-    return vornhost::SwitchTopology(argv[2]);
+    return WithForwards(vornhost::SwitchTopology(argv[2]));
   }
   if (argc != 2) {
     return Result::kUsage;
   }
   if (command == "start") {
-    return vornhost::StartNetwork();
+    return WithForwards(vornhost::StartNetwork());
   }
   if (command == "recover") {
-    return vornhost::Recover();
+    return WithForwards(vornhost::Recover());
   }
   return command == "status" ? vornhost::ShowStatus(std::cout) : Result::kUsage;
 }

@@ -1,4 +1,6 @@
 // Section files of the contract.
+#include "host/utility/section.h"
+
 #include "host/export.h"
 #include "host/utility/atomic_file.h"
 #include "host/utility/error.h"
@@ -9,12 +11,9 @@
 #include <optional>
 #include <set>
 
-namespace {
+namespace vornhost {
 
-using vornhost::Guarded;
-using vornhost::Line;
-using vornhost::LineFormat;
-using vornhost::SetError;
+namespace {
 
 // The header line, with its line end; nothing when reading it would not give back the name.
 std::optional<std::string> RenderHeader(std::string_view name) {
@@ -26,6 +25,8 @@ std::optional<std::string> RenderHeader(std::string_view name) {
   }
   return text + "\n";
 }
+
+} // namespace
 
 std::optional<std::string> RenderSection(std::string_view name, const QARDCSzHash &pairs, const LineFormat &format) {
   auto text = RenderHeader(name);
@@ -39,12 +40,21 @@ std::optional<std::string> RenderSection(std::string_view name, const QARDCSzHas
   return text;
 }
 
+} // namespace vornhost
+
+namespace {
+
+using vornhost::Guarded;
+using vornhost::Line;
+using vornhost::LineFormat;
+using vornhost::SetError;
+
 int AddSection(const char *path, const char *section, const QARDCSzHash *pairs, const char *lineFormat) {
   const auto format = LineFormat::Parse(lineFormat);
   if (path == nullptr || *path == '\0' || section == nullptr || *section == '\0' || pairs == nullptr || !format) {
     return SetError(QARDC_ERR_BAD_ARGUMENT);
   }
-  const auto text = RenderSection(section, *pairs, *format);
+  const auto text = vornhost::RenderSection(section, *pairs, *format);
   if (!text) {
     return SetError(QARDC_ERR_SYNTAX);
   }

@@ -7,9 +7,10 @@
 
 namespace vornhost {
 
-/// What a caller asks for is a hint; a wild number must not cost memory.
+/// What a caller asks for is a hint; neither a wild number nor thousands of small hashes made with the usual 1024 may
+/// cost memory.
 constexpr size_t RoomFor(size_t asked) {
-  return std::min<size_t>(asked, 65536);
+  return std::min<size_t>(asked, 64);
 }
 
 } // namespace vornhost
