@@ -1,20 +1,26 @@
 #include "router/mervane_base.h"
 
 #include "platform/interface.h"
+#include "platform/network.h"
 #include "platform/packageserver.h"
 #include "platform/utility.h"
+#include "router/gatewaylist.h"
 #include "router/log.h"
 #include "router/parameters.h"
 #include "router/portforward.h"
 #include "router/topology.h"
 
 #include <memory>
+#include <utility>
 
 using router::kErrorFailed;
 using router::kErrorParameter;
 using router::kErrorSwitching;
 using VORN::APIRequest;
 using VORN::APIResponse;
+using vornnetwork::network::IP_TYPE;
+using vornnetwork::network::StaticRoute;
+using vornnetwork::network::StaticRouteRule;
 
 // clang-format off
 VORN::APIEntry gTable[] = {
@@ -208,26 +214,185 @@ void GetLocalLan(APIRequest *, APIResponse *response) {
   AnswerPortForward(response, &PortForward::GetLocalLan);
 }
 
-void GetGatewayList(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void GetGatewayList(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  GatewayList gateways;
+  if (!request->HasParam("iptype") || !request->HasParam("type")) {
+    response->SetError(kErrorParameter, Json::Value());
+    return;
+  }
+  const auto family = router::TextOf(request->GetParam("iptype", Json::Value()));
+  const auto filter = router::TextOf(request->GetParam("type", Json::Value()));
+  if (!family || !filter) {
+    response->SetError(kErrorParameter, Json::Value());
+    return;
+  }
+  if (gateways.Get(*family, *filter, result)) {
+    response->SetSuccess(result);
+  } else {
+    response->SetError(kErrorFailed, Json::Value());
+  }
 }
 
-void SetGatewayList(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetGatewayList(APIRequest *request, APIResponse *response) {
+  GatewayList gateways;
+  if (!request->HasParam("iptype")) {
+    response->SetError(kErrorParameter, Json::Value());
+    return;
+  }
+  Json::Value names;
+  if (request->HasParam("ifnames")) {
+    names = request->GetParam("ifnames", Json::Value());
+  }
+  const auto family = router::TextOf(request->GetParam("iptype", Json::Value()));
+  if (!family || !(names.isNull() || router::IsTextList(names))) {
+    response->SetError(kErrorParameter, Json::Value());
+    return;
+  }
+  if (gateways.Set(*family, names)) {
+    response->SetSuccess(Json::Value());
+  } else {
+    response->SetError(kErrorFailed, names);
+  }
 }
 
-void GetStaticRouteRules(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+// The static routes. Their parameters are read all at once, and a fault in them is told in words.
+
+namespace {
+
+constexpr char kNoType[] = "no type parameter";
+constexpr char kNoRules[] = "no rules parameter"; // for "rule" too
+constexpr char kWrongType[] = "wrong type parameter";
+
+struct RouteRequest {
+  Json::Value parameters;
+  IP_TYPE type = vornnetwork::network::IP_TYPE_V4;
+};
+
+void AnswerRouteFault(APIResponse *response, const char *description) {
+  Json::Value payload;
+  payload["desc"] = description;
+  response->SetError(kErrorParameter, payload);
 }
 
-void SetStaticRouteRules(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+// @param[in] list      the member that must be there beside "type"; null: none
+// @param[in] listType  what it must be
+// @return false when a fault was answered
+bool ReadRouteRequest(APIRequest *request, APIResponse *response, const char *list, Json::ValueType listType,
+                      RouteRequest &out) {
+  out.parameters = request->GetParam("", Json::Value());
+  const Json::Value &parameters = out.parameters;
+  if (!parameters.isObject() || !parameters.isMember("type")) {
+    AnswerRouteFault(response, kNoType);
+    return false;
+  }
+  if (list != nullptr && parameters[list].type() != listType) {
+    AnswerRouteFault(response, kNoRules);
+    return false;
+  }
+  const auto type = router::TextOf(parameters["type"]);
+  if (type != "ipv4" && type != "ipv6") {
+    AnswerRouteFault(response, kWrongType);
+    return false;
+  }
+  out.type = type == "ipv4" ? vornnetwork::network::IP_TYPE_V4 : vornnetwork::network::IP_TYPE_V6;
+  return true;
 }
 
-void TestStaticRouteRule(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+// @param[in] object  a rule; a member that it lacks reads as an empty text, or false
+// @return false when a member is of a type that cannot be read so
+bool ReadRule(const Json::Value &object, IP_TYPE type, StaticRouteRule &rule) {
+  const bool isV4 = type == vornnetwork::network::IP_TYPE_V4;
+  const auto length = router::ConvertToText(object[isV4 ? "mask" : "prefix_length"]);
+  const auto destination = router::ConvertToText(object["ip"]);
+  const auto gateway = router::ConvertToText(object["gateway"]);
+  const auto ifname = router::ConvertToText(object["ifname"]);
+  const auto enabled = router::ConvertToBool(object["enable"]);
+  if (!length || !destination || !gateway || !ifname || !enabled) {
+    return false;
+  }
+  rule.ipType = type;
+  if (isV4) {
+    rule.netmask = *length;
+  } else {
+    rule.prefixLength = *length;
+  }
+  rule.destination = *destination;
+  rule.gateway = *gateway;
+  rule.ifname = *ifname;
+  rule.enabled = *enabled;
+  return true;
 }
 
-void GetRouteTables(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+} // namespace
+
+void GetStaticRouteRules(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  StaticRoute service;
+  RouteRequest route;
+  if (!ReadRouteRequest(request, response, nullptr, Json::nullValue, route)) {
+    return;
+  }
+  Json::Value rules(Json::arrayValue);
+  if (service.GetRules(route.type, rules) < 0) {
+    ROUTER_LOG("%s:%d Failed to get rules for static route.");
+    response->SetError(kErrorFailed, Json::Value());
+    return;
+  }
+  result["rules"] = rules;
+  response->SetSuccess(result);
+}
+
+void SetStaticRouteRules(APIRequest *request, APIResponse *response) {
+  StaticRoute service;
+  RouteRequest route;
+  if (!ReadRouteRequest(request, response, "rules", Json::arrayValue, route)) {
+    return;
+  }
+  if (service.SetRules(route.type, route.parameters["rules"]) < 0) {
+    ROUTER_LOG("%s:%d Failed to set rules for static route.");
+    response->SetError(kErrorFailed, Json::Value());
+    return;
+  }
+  response->SetSuccess(Json::Value());
+}
+
+void TestStaticRouteRule(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  StaticRoute service;
+  RouteRequest route;
+  if (!ReadRouteRequest(request, response, "rule", Json::objectValue, route)) {
+    return;
+  }
+  StaticRouteRule rule{};
+  if (!ReadRule(route.parameters["rule"], route.type, rule)) {
+    AnswerRouteFault(response, kWrongType);
+    return;
+  }
+  if (service.TestRuleVaild(rule, result) < 0) {
+    response->SetError(kErrorFailed, Json::Value());
+  } else {
+    response->SetSuccess(result);
+  }
+}
+
+void GetRouteTables(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  StaticRoute service;
+  RouteRequest route;
+  if (!ReadRouteRequest(request, response, nullptr, Json::nullValue, route)) {
+    return;
+  }
+  Json::Value &tables = result["tables"] = Json::Value(Json::arrayValue);
+  if (service.GetRouteTables(route.type, tables) < 0) {
+    ROUTER_LOG("%s:%d Failed to get route tables.");
+    response->SetError(kErrorFailed, Json::Value());
+    return;
+  }
+  for (Json::Value &table : tables) {
+    if (table.isObject() && router::TextOf(std::as_const(table)["name"]) == "main") {
+      table["name"] = "main-table";
+    }
+  }
+  response->SetSuccess(result);
 }

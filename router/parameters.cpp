@@ -104,11 +104,11 @@ bool ParseJsonText(const Json::Value &parameter, Json::Value &value, std::string
   return ParseJson(*text, value, errors);
 }
 
-std::optional<std::string> TextParameter(const VORN::APIRequest &request, const std::string &name) {
-  if (!request.HasParam(name)) {
-    return std::nullopt;
-  }
-  return TextOf(request.GetParam(name, Json::Value()));
+bool IsTextList(const Json::Value &value) {
+  const auto isWholeText = [](const Json::Value &element) {
+    return element.isString() && element.asString().find('\0') == std::string::npos;
+  };
+  return value.isArray() && std::all_of(value.begin(), value.end(), isWholeText);
 }
 
 } // namespace router

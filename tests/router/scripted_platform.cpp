@@ -1,10 +1,14 @@
 #include "tests/router/scripted_platform.h"
 
 #include "platform/interface.h"
+#include "platform/netclient.h"
+#include "platform/network.h"
 #include "platform/packageserver.h"
 #include "platform/utility.h"
 #include "platform/wifi.h"
 
+#include <gtest/gtest.h>
+#include <json/reader.h>
 #include <json/writer.h>
 
 #include <algorithm>
@@ -42,6 +46,14 @@ std::string Text(const Json::Value &value) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";
   return Json::writeString(builder, value);
+}
+
+Json::Value Parse(const std::string &text) {
+  Json::Value value;
+  std::string errors;
+  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+  EXPECT_TRUE(reader->parse(text.data(), text.data() + text.size(), &value, &errors)) << errors;
+  return value;
 }
 
 } // namespace scripted
@@ -202,6 +214,102 @@ int WifiClient::SwitchTopology(const std::string &target) {
 }
 
 } // namespace vornwireless::dbus
+
+// An address keeps its text; what is one and what is not is the platform's to say.
+namespace vornwireless::utils {
+
+IPAddress::IPAddress() = default;
+
+IPAddress &IPAddress::operator=(const std::string &text) {
+  text_ = text;
+  return *this;
+}
+
+const std::string &IPAddress::GetText() const {
+  return text_;
+}
+
+} // namespace vornwireless::utils
+
+// The network daemon.
+
+namespace vornnetwork::dbus {
+
+NetClient::NetClient() {
+  Record("NetClient()");
+}
+
+NetClient::~NetClient() {
+  Record("~NetClient()");
+}
+
+int NetClient::GetGatewayListData(const Json::Value &request, Json::Value &list) {
+  Record("GetGatewayListData(" + Text(request) + ", " + Text(list) + ")");
+  list = Get().gateways;
+  return Get().gatewayListResult;
+}
+
+int NetClient::AddGatewayData(const Json::Value &record) {
+  Record("AddGatewayData(" + Text(record) + ")");
+  auto &results = Get().addGatewayResults;
+  if (results.empty()) {
+    return 0;
+  }
+  const int result = results.front();
+  results.erase(results.begin());
+  return result;
+}
+
+int NetClient::RefreshGateway(const Json::Value &request) {
+  Record("RefreshGateway(" + Text(request) + ")");
+  return Get().refreshResult;
+}
+
+} // namespace vornnetwork::dbus
+
+namespace vornnetwork::network {
+
+// NOLINTNEXTLINE(performance-unnecessary-value-param): the contract's own signature
+int FilterList(std::string filter, Json::Value &list) {
+  Record("FilterList(" + filter + ", " + Text(list) + ")");
+  list = Get().filteredGateways;
+  return Get().filterListResult;
+}
+
+StaticRoute::StaticRoute() {
+  Record("StaticRoute()");
+}
+
+StaticRoute::~StaticRoute() {
+  Record("~StaticRoute()");
+}
+
+int StaticRoute::GetRules(IP_TYPE type, Json::Value &list) {
+  Record("GetRules(" + std::to_string(type) + ", " + Text(list) + ")");
+  list = Get().routeData;
+  return Get().routeResult;
+}
+
+int StaticRoute::SetRules(IP_TYPE type, const Json::Value &list) {
+  Record("SetRules(" + std::to_string(type) + ", " + Text(list) + ")");
+  return Get().routeResult;
+}
+
+int StaticRoute::TestRuleVaild(const StaticRouteRule &rule, Json::Value &result) {
+  Record("TestRuleVaild({" + std::to_string(rule.ipType) + ", " + rule.destination.GetText() + ", " +
+         rule.netmask.GetText() + ", " + rule.gateway.GetText() + ", " + rule.prefixLength + ", " + rule.ifname + ", " +
+         (rule.enabled ? "true" : "false") + "}, " + Text(result) + ")");
+  result = Get().routeData;
+  return Get().routeResult;
+}
+
+int StaticRoute::GetRouteTables(IP_TYPE type, Json::Value &list) {
+  Record("GetRouteTables(" + std::to_string(type) + ", " + Text(list) + ")");
+  list = Get().routeData;
+  return Get().routeResult;
+}
+
+} // namespace vornnetwork::network
 
 // The network library.
 

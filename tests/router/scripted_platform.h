@@ -56,6 +56,17 @@ struct Platform {
   std::vector<RuleRecord> ruleFile;
   int hashes = 0; ///< made so far; the first one is "hash 0"
   int liveHashes = 0;
+
+  int gatewayListResult = 0;
+  Json::Value gateways = Json::Value(Json::arrayValue);
+  int filterListResult = 0;
+  Json::Value filteredGateways = Json::Value(Json::arrayValue); ///< what FilterList leaves
+  std::vector<int> addGatewayResults;                           ///< one a call; 0 when there are no more
+  int setKeyValueResult = 0;
+  int refreshResult = 0;
+
+  int routeResult = 0;   ///< of the static-route call that the test makes
+  Json::Value routeData; ///< what that call gives out
 };
 
 /// The platform of the test that runs. Replaced by a fresh one with Reset.
@@ -68,6 +79,8 @@ int Call(const std::string &call, int normal = 0);
 
 /// One line of JSON.
 std::string Text(const Json::Value &value);
+/// The value of a JSON text; the test fails when it is none.
+Json::Value Parse(const std::string &text);
 
 /// Calls a handler as the framework would.
 class Exchange {

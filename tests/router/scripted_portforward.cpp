@@ -97,7 +97,8 @@ int QARDCFileGetKeyValue(const char *path, const char *key, char *value, size_t 
 }
 
 int QARDCFileSetKeyValue(const char *path, const char *key, const char *value, const char *lineFormat) {
-  return Call("QARDCFileSetKeyValue(" + Text(path) + ", " + key + ", " + value + ", " + lineFormat + ")");
+  return Call("QARDCFileSetKeyValue(" + Text(path) + ", " + key + ", " + value + ", " + lineFormat + ")",
+              Get().setKeyValueResult);
 }
 
 int QARDCErrGet(void) {
