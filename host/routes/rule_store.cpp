@@ -1,0 +1,117 @@
+#include "host/routes/rule_store.h"
+
+#include "host/network/names.h"
+#include "host/network/topology_config.h"
+#include "host/packageserver/strict_json.h"
+#include "host/utility/atomic_file.h"
+#include "host/utility/line_file.h"
+#include "platform/utility.h"
+
+#include <fcntl.h>
+#include <json/writer.h>
+#include <sys/file.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+#include <stdexcept>
+#include <thread>
+
+namespace vornhost {
+
+namespace {
+
+constexpr char kFolder[] = "/etc/iproute2/config";
+
+std::string FileOf(const char *name, int family) {
+  return std::string(kFolder) + "/" + name + (family == AF_INET6 ? "-v6" : "");
+}
+
+[[noreturn]] void Fail(const std::string &what, const char *why) {
+  throw std::runtime_error(what + ": " + why);
+}
+
+std::string ReadOrEmpty(const std::string &path) {
+  std::string content;
+  if (QARDCFileExist(path.c_str()) == 1 && ReadWholeFile(path.c_str(), content) != 0) {
+    Fail(path, "cannot be read");
+  }
+  return content;
+}
+
+void Write(const std::string &path, const std::string &content) {
+  if ((mkdir("/etc/iproute2", 0755) != 0 && errno != EEXIST) || (mkdir(kFolder, 0755) != 0 && errno != EEXIST)) {
+    Fail(kFolder, std::strerror(errno));
+  }
+  const auto render = [&content](const std::string &, std::string &fresh) {
+    fresh = content;
+    return 0;
+  };
+  if (ChangeFile(path.c_str(), render) != 0) {
+    Fail(path, "cannot be written");
+  }
+}
+
+} // namespace
+
+UniqueFd TakeRouteTurn() {
+  mkdir(kRunFolder, 0755);
+  const std::string path = std::string(kRunFolder) + "/routes.lock";
+  UniqueFd file(open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+  if (!file.IsOpen()) {
+    Fail(path, std::strerror(errno));
+  }
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+  while (flock(file.Get(), LOCK_EX | LOCK_NB) != 0) {
+    if ((errno != EWOULDBLOCK && errno != EINTR) || std::chrono::steady_clock::now() > deadline) {
+      Fail(path, std::strerror(errno));
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  }
+  return file;
+}
+
+Json::Value ReadRules(int family) {
+  const std::string path = FileOf("static-route", family);
+  const std::string content = ReadOrEmpty(path);
+  Json::Value rules(Json::arrayValue);
+  if (!content.empty() && !(ParseStrictJson(content, rules) && rules.isArray())) {
+    Fail(path, "no list of rules");
+  }
+  return rules;
+}
+
+void WriteRules(int family, const Json::Value &rules) {
+  Json::StreamWriterBuilder builder;
+  builder["indentation"] = "";
+  std::string content;
+  for (const Json::Value &rule : rules) {
+    content += content.empty() ? "[\n" : ",\n";
+    content += Json::writeString(builder, rule);
+  }
+  Write(FileOf("static-route", family), content.empty() ? "[]\n" : content + "\n]\n");
+}
+
+std::vector<std::string> ReadGatewayOrder(int family) {
+  const std::string content = ReadOrEmpty(FileOf("gateway-order", family));
+  std::vector<std::string> names;
+  LineReader lines(content);
+  for (std::string_view line; lines.Next(line);) {
+    if (IsInterfaceName(std::string(line))) {
+      names.emplace_back(line);
+    }
+  }
+  return names;
+}
+
+void WriteGatewayOrder(int family, const std::vector<std::string> &names) {
+  std::string content;
+  for (const std::string &name : names) {
+    content += name + "\n";
+  }
+  Write(FileOf("gateway-order", family), content);
+}
+
+} // namespace vornhost
