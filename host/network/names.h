@@ -5,6 +5,7 @@
 namespace vornhost {
 
 constexpr char kWanPort[] = "eth0";
+constexpr char kSecondWanPort[] = "eth1"; // where there is one; no topology has it in a bridge
 constexpr char kLanBridge[] = "lbr0";   // LAN ports, in router and client topology
 constexpr char kGuestBridge[] = "gbr0"; // guest network, in every topology
 constexpr char kOneBridge[] = "br0";    // LAN ports and WAN port together, in bridge topology
@@ -14,6 +15,7 @@ constexpr char kBridgeTopology[] = "bridge";
 constexpr char kClientTopology[] = "client";
 
 constexpr char kWanConfig[] = "/etc/sysconfig/network-scripts/ifcfg-eth0";
+constexpr char kSecondWanConfig[] = "/etc/sysconfig/network-scripts/ifcfg-eth1";
 constexpr char kLanConfig[] = "/etc/sysconfig/network-scripts/ifcfg-lbr0";
 constexpr char kGuestConfig[] = "/etc/sysconfig/network-scripts/ifcfg-gbr0";
 constexpr char kOneBridgeConfig[] = "/etc/sysconfig/network-scripts/ifcfg-br0";

@@ -65,7 +65,9 @@ Link LinkOf(rtnl_link *link) {
   const char *kind = rtnl_link_get_type(link);
   out.kind = kind != nullptr ? kind : "";
   out.mac = Text(rtnl_link_get_addr(link));
-  out.up = (rtnl_link_get_flags(link) & IFF_UP) != 0;
+  const unsigned flags = rtnl_link_get_flags(link);
+  out.up = (flags & IFF_UP) != 0;
+  out.running = out.up && (flags & IFF_RUNNING) != 0;
   out.master = rtnl_link_get_master(link);
   uint8_t mode = 0;
   if (rtnl_link_inet6_get_addr_gen_mode(link, &mode) == 0) {
@@ -89,10 +91,14 @@ Address AddressOf(rtnl_addr *address) {
   return out;
 }
 
+bool IsOfKind(rtnl_route *route) {
+  return rtnl_route_get_type(route) == RTN_UNICAST && rtnl_route_get_nnexthops(route) == 1;
+}
+
 bool IsKept(rtnl_route *route) {
   const uint8_t protocol = rtnl_route_get_protocol(route);
-  return rtnl_route_get_table(route) != RT_TABLE_LOCAL && rtnl_route_get_type(route) == RTN_UNICAST &&
-         protocol != RTPROT_KERNEL && protocol != RTPROT_RA && rtnl_route_get_nnexthops(route) == 1;
+  return rtnl_route_get_table(route) != RT_TABLE_LOCAL && IsOfKind(route) && protocol != RTPROT_KERNEL &&
+         protocol != RTPROT_RA;
 }
 
 Route RouteOf(rtnl_route *route) {
@@ -109,6 +115,23 @@ Route RouteOf(rtnl_route *route) {
   out.scope = rtnl_route_get_scope(route);
   out.hopFlags = rtnl_route_nh_get_flags(hop) & RTNH_F_ONLINK;
   return out;
+}
+
+struct RouteCollector {
+  const Netlink::RouteFilter &isWanted;
+  std::vector<Route> routes;
+};
+
+int CollectRoute(nl_msg *message, void *context) {
+  auto *collector = static_cast<RouteCollector *>(context);
+  rtnl_route *raw = nullptr;
+  if (rtnl_route_parse(nlmsg_hdr(message), &raw) == 0) {
+    const std::unique_ptr<rtnl_route, void (*)(rtnl_route *)> route(raw, rtnl_route_put);
+    if (collector->isWanted(raw)) {
+      collector->routes.push_back(RouteOf(raw));
+    }
+  }
+  return NL_OK;
 }
 
 int KeepErrno(sockaddr_nl *, nlmsgerr *error, void *code) {
@@ -200,13 +223,14 @@ int Netlink::TryDump(nl_cache *cache, int type, int family) {
 }
 
 // A list that changed while it was read is read again.
+constexpr int kDumpTries = 10;
+
 Netlink::Cache Netlink::Dump(const char *kind, int type, int family) {
-  constexpr int kTries = 10;
   nl_cache *raw = nullptr;
   Check(nl_cache_alloc_name(kind, &raw), kind);
   Cache cache(raw);
   int result = TryDump(raw, type, family);
-  for (int attempt = 1; result == -NLE_DUMP_INTR && attempt < kTries; ++attempt) {
+  for (int attempt = 1; result == -NLE_DUMP_INTR && attempt < kDumpTries; ++attempt) {
     nl_cache_clear(raw);
     result = TryDump(raw, type, family);
   }
@@ -246,18 +270,39 @@ std::vector<Address> Netlink::Addresses() {
   return out;
 }
 
-std::vector<Route> Netlink::Routes() {
-  std::vector<Route> out;
-  for (const int family : {AF_INET, AF_INET6}) {
-    const Cache cache = Dump("route/route", RTM_GETROUTE, family);
-    ForEach(cache, [&out](nl_object *object) {
-      auto *route = reinterpret_cast<rtnl_route *>(object);
-      if (IsKept(route)) {
-        out.push_back(RouteOf(route));
-      }
-    });
+// libnl's caches hold one route to a destination with a metric, where IPv6 may have several: routes are read one by
+// one.
+std::vector<Route> Netlink::DumpRoutes(int family, const RouteFilter &isWanted) {
+  RouteCollector collector{isWanted, {}};
+  const std::unique_ptr<nl_cb, void (*)(nl_cb *)> callbacks(nl_cb_alloc(NL_CB_DEFAULT), nl_cb_put);
+  if (!callbacks) {
+    throw std::bad_alloc();
   }
+  nl_cb_set(callbacks.get(), NL_CB_VALID, NL_CB_CUSTOM, CollectRoute, &collector);
+  int result = -NLE_DUMP_INTR;
+  for (int attempt = 0; result == -NLE_DUMP_INTR && attempt < kDumpTries; ++attempt) {
+    collector.routes.clear();
+    result = nl_rtgen_request(socket_.get(), RTM_GETROUTE, family, NLM_F_DUMP);
+    if (result >= 0) {
+      result = nl_recvmsgs(socket_.get(), callbacks.get());
+    }
+  }
+  if (result < 0) {
+    Fail(std::string("list of routes: ") + nl_geterror(result), EIO);
+  }
+  return std::move(collector.routes);
+}
+
+std::vector<Route> Netlink::Routes() {
+  std::vector<Route> out = DumpRoutes(AF_INET, IsKept);
+  const std::vector<Route> other = DumpRoutes(AF_INET6, IsKept);
+  out.insert(out.end(), other.begin(), other.end());
   return out;
+}
+
+std::vector<Route> Netlink::RoutesOf(int family, uint32_t table) {
+  return DumpRoutes(family,
+                    [table](rtnl_route *route) { return rtnl_route_get_table(route) == table && IsOfKind(route); });
 }
 
 void Netlink::Send(Message &message, const std::string &what) {
@@ -410,12 +455,20 @@ void Netlink::ChangeRoute(const Route &route, int type, int flags) {
 
 void Netlink::AddRoute(const Route &route) {
   try {
-    ChangeRoute(route, RTM_NEWROUTE, NLM_F_CREATE | NLM_F_EXCL);
+    InsertRoute(route);
   } catch (const NetlinkError &error) {
     if (error.GetCode() != EEXIST) {
       throw;
     }
   }
+}
+
+void Netlink::InsertRoute(const Route &route) {
+  ChangeRoute(route, RTM_NEWROUTE, NLM_F_CREATE | NLM_F_EXCL);
+}
+
+void Netlink::ReplaceRoute(const Route &route) {
+  ChangeRoute(route, RTM_NEWROUTE, NLM_F_CREATE | NLM_F_REPLACE);
 }
 
 void Netlink::DeleteRoute(const Route &route) {

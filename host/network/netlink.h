@@ -5,6 +5,7 @@
 #define HOST_NETWORK_NETLINK_H
 
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -25,6 +26,7 @@ struct Link {
   std::string kind;                   ///< "bridge", "veth", ...; empty for hardware
   std::string mac;                    ///< lower case, colons; empty when there is none
   bool up = false;                    ///< administratively
+  bool running = false;               ///< up, and something is at the other end
   int master = 0;                     ///< index of the bridge that it is a port of; 0 when it is none
   std::optional<uint8_t> addrGenMode; ///< IN6_ADDR_GEN_MODE_*; nothing when IPv6 is off for it
 };
@@ -72,6 +74,8 @@ private:
 /// Every operation throws NetlinkError when it fails. An object belongs to one thread.
 class Netlink {
 public:
+  using RouteFilter = std::function<bool(rtnl_route *)>;
+
   Netlink();
 
   std::vector<Link> Links();
@@ -80,6 +84,8 @@ public:
   std::vector<Address> Addresses();
   /// Those of every table but the local one; without those that the kernel itself makes or that a router advertises.
   std::vector<Route> Routes();
+  /// Those of one table and family, whoever made them.
+  std::vector<Route> RoutesOf(int family, uint32_t table);
 
   /// Makes a bridge that forwards at once (no spanning tree, no delay), still down.
   /// @param[in] mac  empty: the kernel chooses
@@ -96,6 +102,10 @@ public:
   void AddAddress(const Address &address);
   void DeleteAddress(const Address &address);
   void AddRoute(const Route &route);
+  /// One that is there already, be it another's, is EEXIST.
+  void InsertRoute(const Route &route);
+  /// Takes the place of the route to the same destination with the same metric, in one step.
+  void ReplaceRoute(const Route &route);
   /// One that is not there any more is no error.
   void DeleteRoute(const Route &route);
 
@@ -116,6 +126,7 @@ private:
   /// After a failure on the way libnl waits for the answer that did not come, for ever.
   [[noreturn]] void Fail(const std::string &what, int code);
 
+  std::vector<Route> DumpRoutes(int family, const RouteFilter &isWanted);
   void Send(Message &message, const std::string &what);
   void ChangeAddress(const Address &address, int type, int flags);
   void ChangeRoute(const Route &route, int type, int flags);

@@ -36,6 +36,23 @@ bool HasIpv4(Netlink &netlink, int index) {
                      [index](const Address &address) { return address.index == index && address.family == AF_INET; });
 }
 
+void ConnectPort(Netlink &netlink, const std::string &port, const PortConfig &config, bool leaseNeeded) {
+  NetworkState state(netlink);
+  // A host that forwards does not listen to router advertisements, unless told so (kernel: ip-sysctl, accept_ra).
+  WriteSetting("/proc/sys/net/ipv6/conf/" + port + "/accept_ra", "2");
+  if (config.dhcp) {
+    leaseNeeded ? DhcpClient(port).StartWithLease() : DhcpClient(port).Start();
+  } else if (!config.address.empty()) {
+    state.AddAddress(port, config.address);
+    if (!config.gateway.empty()) {
+      state.AddDefaultRoute(port, config.gateway);
+    }
+  }
+  if (leaseNeeded && !HasIpv4(netlink, state.Get(port).index)) {
+    throw std::runtime_error(port + " has no address");
+  }
+}
+
 class Configurer {
 public:
   Configurer(Netlink &netlink, const std::string &topology)
@@ -56,6 +73,7 @@ public:
       StartBridge(kGuestBridge, guest.address);
     }
     Connect();
+    ConnectSecond();
     return whole_;
   }
 
@@ -121,6 +139,20 @@ private:
     });
   }
 
+  // A second way out beside the topology's own, where there is one and its file says so.
+  void ConnectSecond() {
+    const PortConfig config = ReadPortConfig(kSecondWanConfig);
+    if (!config.present || !netlink_.FindLink(kSecondWanPort)) {
+      return;
+    }
+    Do("connect", kSecondWanPort, [&] {
+      state_.SetUp(kSecondWanPort);
+      if (!DhcpClient(kSecondWanPort).IsRunning()) {
+        ConnectPort(netlink_, kSecondWanPort, config, false);
+      }
+    });
+  }
+
   Netlink &netlink_;
   NetworkState state_;
   std::string topology_;
@@ -155,22 +187,8 @@ void LetBridgesForward() {
 }
 
 void ConnectUplink(Netlink &netlink, const std::string &topology, bool leaseNeeded) {
-  const std::string uplink = LayoutOf(topology).uplink;
   const PortConfig config = topology == kBridgeTopology ? ReadOneBridgeConfig() : ReadPortConfig(kWanConfig);
-  NetworkState state(netlink);
-  // A host that forwards does not listen to router advertisements, unless told so (kernel: ip-sysctl, accept_ra).
-  WriteSetting("/proc/sys/net/ipv6/conf/" + uplink + "/accept_ra", "2");
-  if (config.dhcp) {
-    leaseNeeded ? DhcpClient(uplink).StartWithLease() : DhcpClient(uplink).Start();
-  } else if (!config.address.empty()) {
-    state.AddAddress(uplink, config.address);
-    if (!config.gateway.empty()) {
-      state.AddDefaultRoute(uplink, config.gateway);
-    }
-  }
-  if (leaseNeeded && !HasIpv4(netlink, state.Get(uplink).index)) {
-    throw std::runtime_error(uplink + " has no address");
-  }
+  ConnectPort(netlink, LayoutOf(topology).uplink, config, leaseNeeded);
 }
 
 bool ApplyConfiguration(Netlink &netlink) {

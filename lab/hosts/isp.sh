@@ -16,7 +16,7 @@ prepare() {
   make_certificates /var/lib/pki
   echo "page of isp" >/var/www/index.html
   cp -r "$LAB/hosts/isp/packages" /var/www/
-  sysctl -qw net.ipv6.conf.all.forwarding=1
+  sysctl -qw net.ipv6.conf.all.forwarding=1 net.ipv6.conf.all.ignore_routes_with_linkdown=1
 }
 
 start() {
@@ -24,7 +24,13 @@ start() {
 link set eth0 up
 addr add 203.0.113.1/24 dev eth0
 addr add 2001:db8:1::1/64 dev eth0
-route add 2001:db8:2::/64 via fe80::5eff:fe10:1 dev eth0
+link set eth1 up
+addr add 198.51.100.1/24 dev eth1
+addr add 192.0.2.80/32 dev lo
+addr add 2001:db8:80::80/128 dev lo
+addr add 2001:db8:9::1/64 dev eth1
+route add 2001:db8:2::/64 via fe80::5eff:fe10:1 dev eth0 metric 100
+route add 2001:db8:2::/64 via fe80::5eff:fe10:2 dev eth1 metric 200
 COMMANDS
   # Both go to the background once their sockets are bound; nothing has to wait for them.
   dnsmasq --conf-file="$LAB/hosts/isp/dnsmasq.conf" --log-facility="$LOG/isp-dnsmasq"

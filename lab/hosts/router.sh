@@ -30,6 +30,7 @@ start() {
   launch syslogd busybox syslogd -n -S -O "$LOG/syslog"
   while [ ! -S /run/dev-log ]; do sleep 0.005; done
   /usr/vorn/sbin/vorntopology start
+  launch vornroutes /usr/vorn/sbin/vornroutes watch # as vorn-routes.service does
   ip address add 2001:db8:2::1/64 dev lbr0 # the provider routes this prefix here; a switch takes it away with lbr0
   dnsmasq --conf-file=/etc/dnsmasq.d/vorn.conf --dhcp-hostsfile=/etc/vorn/addresses --no-ping \
     --log-facility="$LOG/router-dnsmasq"

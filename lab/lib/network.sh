@@ -7,6 +7,7 @@
 #                           │                ├ player
 #                           │                └ sensor    (IPv6 only)
 #                           └ guest1 ── phone
+#   isp eth1 ── eth1 router                            198.51.100.0/24, 2001:db8:9::/64  second WAN, down until asked for
 # Every host calls its end eth0. The switch is an ordinary one without address, in the first process's own network.
 
 readonly DEVICES=(laptop printer camera player sensor phone)
@@ -44,6 +45,7 @@ lay_wires() {
   sysctl -qw net.ipv6.conf.all.disable_ipv6=1 # the switch takes no part in what it carries
   ip -b - <<COMMANDS
 link add eth0 netns router address ${MAC[router]} type veth peer name eth0 netns isp address ${MAC[isp]}
+link add eth1 netns router address 02:00:5e:10:00:02 type veth peer name eth1 netns isp address 02:00:5e:10:00:fd
 $(cable lan1 laptop)
 $(cable lan2 printer)
 $(cable guest1 phone)

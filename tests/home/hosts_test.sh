@@ -30,7 +30,7 @@ check "the sensor reads the provider's page over IPv6" eventually 5 sensor_reads
 # A router that boots in topology "bridge" has no lbr0 yet when dnsmasq starts.
 switch_to() { at router /usr/vorn/sbin/vorntopology switch "$1"; }
 restart_dnsmasq() {
-  at router sh -c 'kill -KILL "$(cat /run/dnsmasq.pid)"'
+  at router sh -c 'pid=$(cat /run/dnsmasq.pid); kill -KILL "$pid"; while kill -0 "$pid"; do sleep 0.01; done' 2>/dev/null
   at router dnsmasq --conf-file=/etc/dnsmasq.d/vorn.conf --dhcp-hostsfile=/etc/vorn/addresses --no-ping
 }
 need "the router goes to \"bridge\"" switch_to bridge

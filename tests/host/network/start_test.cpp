@@ -128,7 +128,9 @@ TEST_F(DhcpScript, SetsAddressRouteAndNameServers) {
             0);
   EXPECT_THAT(Addresses(), HasSubstr("10.9.0.5/16"));
   EXPECT_THAT(Shell("ip route"), HasSubstr("default via 10.9.0.1 dev lan1"));
-  EXPECT_EQ(ReadFile("/etc/resolv.conf"), "search home.arpa\nnameserver 10.9.0.1\nnameserver 10.9.0.3\n");
+  // The other way out, eth0, has a lease too: its server stands behind.
+  EXPECT_EQ(ReadFile("/etc/resolv.conf"),
+            "search home.arpa\nnameserver 10.9.0.1\nnameserver 10.9.0.3\nnameserver 203.0.113.1\n");
 }
 
 TEST_F(DhcpScript, NewLeaseReplacesTheOldOneAndNothingElse) {
