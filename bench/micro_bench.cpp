@@ -7,7 +7,6 @@
 
 #include <string>
 
-
 namespace {
 
 // The list that an owner opens first, with the keys of a client device.

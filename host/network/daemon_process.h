@@ -20,8 +20,8 @@ public:
   /// Whether it is in the background. One that still waits for its first success in the foreground does not count: its
   /// output goes to whoever started it, and without a reader it dies of it.
   bool IsRunning() const;
-  /// After its start: the process that was started ends before the one that stays is ready. Throws std::runtime_error when
-  /// it is not there within a second.
+  /// After its start: the process that was started ends before the one that stays is ready. Throws std::runtime_error
+  /// when it is not there within a second.
   void AwaitBackground() const;
   /// Ends it and removes its pid file. Throws std::runtime_error when it lives on.
   void Stop() const;

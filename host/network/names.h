@@ -6,9 +6,9 @@ namespace vornhost {
 
 constexpr char kWanPort[] = "eth0";
 constexpr char kSecondWanPort[] = "eth1"; // where there is one; no topology has it in a bridge
-constexpr char kLanBridge[] = "lbr0";   // LAN ports, in router and client topology
-constexpr char kGuestBridge[] = "gbr0"; // guest network, in every topology
-constexpr char kOneBridge[] = "br0";    // LAN ports and WAN port together, in bridge topology
+constexpr char kLanBridge[] = "lbr0";     // LAN ports, in router and client topology
+constexpr char kGuestBridge[] = "gbr0";   // guest network, in every topology
+constexpr char kOneBridge[] = "br0";      // LAN ports and WAN port together, in bridge topology
 
 constexpr char kRouterTopology[] = "router";
 constexpr char kBridgeTopology[] = "bridge";
