@@ -133,6 +133,7 @@ int StartProgram(const std::vector<std::string> &arguments) {
   const pid_t process = fork();
   if (process == 0) {
     std::vector<char *> pointers;
+    pointers.reserve(arguments.size() + 1);
     for (const std::string &argument : arguments) {
       pointers.push_back(const_cast<char *>(argument.c_str()));
     }

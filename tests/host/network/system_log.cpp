@@ -34,8 +34,7 @@ std::string Line(const std::string &raw) {
   if (raw.empty() || raw[0] != '<' || end == std::string::npos || raw.size() < end + 1 + kTime) {
     return raw;
   }
-  return "<" + std::to_string(std::atoi(raw.c_str() + 1) % 8) + "> " +
-         raw.substr(end + 1 + kTime); // NOLINT(cert-err34-c)
+  return "<" + std::to_string(std::strtol(raw.c_str() + 1, nullptr, 10) % 8) + "> " + raw.substr(end + 1 + kTime);
 }
 
 // A program that logs waits when ten lines are unread.

@@ -110,8 +110,10 @@ TEST_F(TopologyText, WanPortInTheLanBridgeIsClientWithAWirelessUplink) {
 
 TEST_F(TopologyText, ThreadsAskAtOnce) {
   MakePorts();
+  constexpr int kThreads = 8;
   std::vector<std::thread> threads;
-  for (int number = 0; number < 8; ++number) {
+  threads.reserve(kThreads);
+  for (int number = 0; number < kThreads; ++number) {
     threads.emplace_back([] {
       for (int round = 0; round < 2000; ++round) {
         ASSERT_EQ(Topology(), "router");
