@@ -32,7 +32,7 @@ Json::Value Devices(int64_t count) {
 
 void WriteOwn(benchmark::State &state) {
   const Json::Value value = Devices(state.range(0));
-  for (auto round : state) {
+  while (state.KeepRunning()) {
     std::string text;
     vornwebapi::WriteJson(value, text);
     benchmark::DoNotOptimize(text);
@@ -43,7 +43,7 @@ void WriteJsonCpp(benchmark::State &state) {
   const Json::Value value = Devices(state.range(0));
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";
-  for (auto round : state) {
+  while (state.KeepRunning()) {
     std::string text = Json::writeString(builder, value);
     benchmark::DoNotOptimize(text);
   }
