@@ -19,8 +19,16 @@ namespace hosttest {
 
 namespace {
 
-std::mutex mutex;
-std::string lines;
+struct Log {
+  std::mutex mutex;
+  std::string lines;
+};
+
+// Never destroyed: the thread that writes it ends with the process.
+Log &TheLog() {
+  static Log &log = *new Log;
+  return log;
+}
 
 constexpr char kDevices[] = R"(set -e; mkdir -p /mnt/own-dev; mount -t tmpfs tmpfs /mnt/own-dev
 for device in null zero full random urandom tty; do
@@ -39,10 +47,11 @@ std::string Line(const std::string &raw) {
 
 // A program that logs waits when ten lines are unread.
 void Keep(int logSocket) {
+  Log &log = TheLog();
   std::array<char, 8192> buffer{};
   for (ssize_t got = 0; (got = recv(logSocket, buffer.data(), buffer.size(), 0)) >= 0;) {
-    const std::lock_guard lock(mutex);
-    lines += Line(std::string(buffer.data(), static_cast<size_t>(got))) + "\n";
+    const std::lock_guard lock(log.mutex);
+    log.lines += Line(std::string(buffer.data(), static_cast<size_t>(got))) + "\n";
   }
 }
 
@@ -62,8 +71,9 @@ void OpenSystemLog() {
 
 std::string TakeSystemLog() {
   Sleep(20); // what was sent last is still on its way to the thread
-  const std::lock_guard lock(mutex);
-  return std::exchange(lines, {});
+  Log &log = TheLog();
+  const std::lock_guard lock(log.mutex);
+  return std::exchange(log.lines, {});
 }
 
 } // namespace hosttest
