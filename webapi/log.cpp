@@ -82,10 +82,9 @@ void Log(LogKind kind, const char *format, ...) {
   va_end(arguments);
 }
 
-std::string Printable(std::string_view text) {
-  constexpr size_t kLongest = 100;
+std::string Printable(std::string_view text, size_t longest) {
   std::string out;
-  for (const char c : text.substr(0, kLongest)) {
+  for (const char c : text.substr(0, longest)) {
     const auto byte = static_cast<unsigned char>(c);
     if (byte >= 0x20 && byte < 0x7f && c != '\\') {
       out += c;
@@ -95,7 +94,7 @@ std::string Printable(std::string_view text) {
     std::snprintf(escaped.data(), escaped.size(), "\\x%02x", byte);
     out += escaped.data();
   }
-  if (text.size() > kLongest) {
+  if (text.size() > longest) {
     out += "...";
   }
   return out;

@@ -4,6 +4,7 @@
 
 #include "webapi/export.h"
 
+#include <cstddef>
 #include <string>
 #include <string_view>
 
@@ -28,9 +29,9 @@ VORN_WEBAPI_EXPORT void OpenLog(bool toStandardError);
 
 VORN_WEBAPI_EXPORT void Log(LogKind kind, const char *format, ...) __attribute__((format(printf, 2, 3)));
 
-/// A text from outside as it may stand in a line: bytes other than printable ASCII as \xNN, the rest after 100 left
-/// out.
-VORN_WEBAPI_EXPORT std::string Printable(std::string_view text);
+/// A text from outside as it may stand in a line: bytes other than printable ASCII as \xNN, the rest after the first
+/// `longest` bytes left out.
+VORN_WEBAPI_EXPORT std::string Printable(std::string_view text, size_t longest = 100);
 
 } // namespace vornwebapi
 

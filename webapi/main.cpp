@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <climits>
 #include <csignal>
 #include <cstdint>
 #include <cstdio>
@@ -47,9 +48,12 @@ void RaiseDescriptorLimit(const vornwebapi::Config &config) {
   }
 }
 
+/// A fault names a file first and the reason last: none of it may be left out.
 int Refuse(const std::string &fault) {
-  std::fprintf(stderr, "vornwebd: %s\n", fault.c_str());
-  vornwebapi::Log(vornwebapi::LogKind::kLifecycle, "not started: %s", vornwebapi::Printable(fault).c_str());
+  constexpr size_t kLongestFault = 2 * PATH_MAX;
+  const std::string text = vornwebapi::Printable(fault, kLongestFault);
+  std::fprintf(stderr, "vornwebd: %s\n", text.c_str());
+  vornwebapi::Log(vornwebapi::LogKind::kLifecycle, "not started: %s", text.c_str());
   return EXIT_FAILURE;
 }
 
@@ -79,7 +83,7 @@ int main(int argc, char **argv) {
     return Refuse(fault);
   }
   vornwebapi::Log(vornwebapi::LogKind::kLifecycle, "serving %zu rows of %s on %s", rows.size(),
-                  vornwebapi::Printable(config.module).c_str(), server.Address().c_str());
+                  vornwebapi::Printable(config.module, PATH_MAX).c_str(), server.Address().c_str());
   if (!server.Run(stopDescriptor)) {
     _exit(EXIT_SUCCESS); // threads of the module still run: nothing that they use may be torn down
   }

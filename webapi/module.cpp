@@ -1,6 +1,5 @@
 #include "webapi/module.h"
 
-#include "webapi/log.h"
 #include "webapi/text.h"
 
 #include <dlfcn.h>
@@ -23,7 +22,7 @@ bool IsEnd(const VORN::APIEntry &row) {
 }
 
 std::string Describe(size_t number, const VORN::APIEntry &row) {
-  const auto name = [](const char *text) { return text == nullptr ? std::string("(null)") : Printable(text); };
+  const auto name = [](const char *text) { return text == nullptr ? std::string("(null)") : std::string(text); };
   return "row " + std::to_string(number) + " (" + name(row.api) + ", version " + std::to_string(row.version) + ", " +
          name(row.method) + ")";
 }
@@ -86,23 +85,23 @@ bool LoadModule(const std::string &path, std::vector<VORN::APIEntry> &rows, std:
   try { // what a constructor of the library's own throws ends the process: the dynamic linker lets nothing through
     void *library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
     if (library == nullptr) {
-      fault = Printable(dlerror());
+      fault = dlerror();
       return false;
     }
     const auto getTable = reinterpret_cast<GetTable>(dlsym(library, "GetAPITable"));
     if (getTable == nullptr) {
-      fault = Printable(path) + ": no GetAPITable in it";
+      fault = path + ": no GetAPITable in it";
       return false;
     }
     if (!CheckTable(getTable(), rows, fault)) {
-      fault = Printable(path) + ": " + fault;
+      fault = path + ": " + fault;
       return false;
     }
   } catch (const std::exception &error) {
-    fault = Printable(path) + ": threw while it was loaded: " + Printable(error.what());
+    fault = path + ": threw while it was loaded: " + error.what();
     return false;
   } catch (...) {
-    fault = Printable(path) + ": threw while it was loaded";
+    fault = path + ": threw while it was loaded";
     return false;
   }
   return true;

@@ -52,6 +52,15 @@ const std::vector<BadModule> kBadModules = {
     {"does_not_exist", "does_not_exist.so: cannot open shared object file"},
 };
 
+TEST(StartTest, TheReasonIsSaidHoweverLongThePathIs) {
+  const std::string name = std::string(200, 'd') + "/" + std::string(200, 'm');
+  ServerProcess server({.module = name});
+  EXPECT_EQ(server.Wait(), 1);
+  EXPECT_NE(server.Log().find(name + ".so: cannot open shared object file: No such file or directory"),
+            std::string::npos)
+      << server.Log();
+}
+
 INSTANTIATE_TEST_SUITE_P(Start, BadModuleTest, testing::ValuesIn(kBadModules),
                          [](const testing::TestParamInfo<BadModule> &each) { return each.param.name; });
 
