@@ -2,7 +2,8 @@
 //
 // Files are changed whole and durably: readers see the old file or the new one, and what a call reported as done is
 // still there after a power cut. Writers of one file take turns, across processes. A text that the file's syntax cannot
-// hold, so that it would not be read back as it was given, is refused with a negative result and nothing is written.
+// hold, so that it would not be read back as it was given, is refused with a negative result and nothing is written. A
+// file of more than 1 MiB is neither read nor written, and a symbolic link in a file's place is read but never written.
 //
 // Every function may be called from several threads at once; a hash or a list belongs to one thread at a time. Pointers
 // that are passed in are not kept. A null pointer where a text or a handle is asked for is an error, never a crash.
@@ -79,8 +80,7 @@ int QARDCFileEnumSection(const char *path, struct QARDCSzList *sections);
 
 /// @param[in,out] pairs  the pairs of the first section of that name are set in it; what else it holds stays
 /// @return how many pairs the section has; 0 when it has none, negative when there is no such section or the file
-/// cannot
-///         be read
+///         cannot be read
 int QARDCFileGetSection(const char *path, const char *section, struct QARDCSzHash *pairs);
 
 /// @retval 1  there is something of that name, of whatever kind
@@ -102,7 +102,7 @@ void QARDCSzHashFree(struct QARDCSzHash *hash); ///< null is allowed
 /// @retval <0  a null argument, an empty key, or no memory
 int QARDCSzHashSetValue(struct QARDCSzHash *hash, const char *key, const char *value);
 /// @return the value, owned by the hash and valid until the key is set again or removed or the hash freed; null when
-/// absent
+///         absent
 const char *QARDCSzHashGetValue(struct QARDCSzHash *hash, const char *key);
 /// @return the value that the key had, owned by the hash and valid until a key is removed again or the hash is freed;
 ///         null when absent
@@ -115,7 +115,8 @@ void QARDCSzListFree(struct QARDCSzList *list); ///< null is allowed
 
 // Programs are started by their absolute path with the given argument vector, without a shell, with standard input from
 // /dev/null, every other descriptor closed and signals at their defaults, in a process group of their own, which is
-// ended at the time limit. What they print goes to the system log, cut at 1 MiB. A program that is not owned by root,
+// ended at the time limit. Of what they print, the first 100 lines go to the system log, each cut at 500 bytes; what
+// comes after the first MiB is not looked at. A program that is not owned by root,
 // or that others may write, is not run.
 
 /// Runs a program with up to four arguments, the first null one ending them, and waits for it. A `program` text with
