@@ -31,7 +31,8 @@ int VORNScheduleSet(const struct VORNScheduleRecord *record, int flags);
 int VORNScheduleRemove(const char *command);
 
 /// The slot of the weekly grid that holds the present moment, in local time.
-/// @return 0 to 167: day of the week (Sunday = 0) x 24 + hour
+/// @retval 0 to 167  day of the week (Sunday = 0) x 24 + hour
+/// @retval <0        there is none: the clock was never set
 int VORNSchedGetNowIndex(void);
 
 #ifdef __cplusplus

@@ -7,10 +7,14 @@
 #include "router/gatewaylist.h"
 #include "router/log.h"
 #include "router/parameters.h"
+#include "router/parental.h"
 #include "router/portforward.h"
 #include "router/topology.h"
 
+#include <algorithm>
 #include <memory>
+#include <optional>
+#include <string>
 #include <utility>
 
 using router::kErrorFailed;
@@ -79,6 +83,42 @@ void AnswerPortForward(APIResponse *response, bool (PortForward::*get)(Json::Val
   } else {
     response->SetError(kErrorFailed, result);
   }
+}
+
+// Reads the array that the text parameter "rules" holds, when there is one, into the member of that name.
+// @return false when it cannot be read; the request is answered then
+bool ReadRules(const APIRequest *request, APIResponse *response, Json::Value &parameters) {
+  if (!request->HasParam("rules")) {
+    return true; // the working object says what is missing
+  }
+  Json::Value &rules = parameters["rules"];
+  std::string errors;
+  if (!router::ParseJsonText(request->GetParam("rules", Json::Value()), rules, errors)) {
+    ROUTER_LOG("%s:%d Error when parsing array, msg: %s", errors.c_str());
+    response->SetError(kErrorFailed, Json::Value());
+    return false;
+  }
+  if (!rules.isArray()) {
+    ROUTER_LOG("%s:%d Data rules from req is not an json array");
+    response->SetError(kErrorFailed, rules);
+    return false;
+  }
+  return true;
+}
+
+// Whether the text reaches a line of the rule file as it is.
+bool IsOneLine(const std::optional<std::string> &text) {
+  return text && text->find_first_of("\r\n") == std::string::npos;
+}
+
+// A rule that the rule file would not hold is found before anything is stopped or written: it must not end the
+// enforcement of the others. The address names a section, so it stands between brackets; whether it is one is the
+// enforcing program's business.
+bool CanBeKept(const Json::Value &rule) {
+  const auto mac = router::WholeTextOf(router::MemberOf(rule, "mac"));
+  return IsOneLine(mac) && !mac->empty() && mac->find_first_of("[] \t") == std::string::npos &&
+         IsOneLine(router::WholeTextOf(router::MemberOf(rule, "clientname"))) &&
+         IsOneLine(router::WholeTextOf(router::MemberOf(rule, "schedule")));
 }
 
 // For the rows whose subject this version does not have yet.
@@ -154,19 +194,8 @@ void GetPortForward(APIRequest *, APIResponse *response) {
 void SetPortForward(APIRequest *request, APIResponse *response) {
   Json::Value parameters(Json::objectValue);
   PortForward portForward;
-  if (request->HasParam("rules")) {
-    Json::Value &rules = parameters["rules"];
-    std::string errors;
-    if (!router::ParseJsonText(request->GetParam("rules", Json::Value()), rules, errors)) {
-      ROUTER_LOG("%s:%d Error when parsing array, msg: %s", errors.c_str());
-      response->SetError(kErrorFailed, Json::Value());
-      return;
-    }
-    if (!rules.isArray()) {
-      ROUTER_LOG("%s:%d Data rules from req is not an json array");
-      response->SetError(kErrorFailed, rules);
-      return;
-    }
+  if (!ReadRules(request, response, parameters)) {
+    return;
   }
   if (portForward.SetPortForward(parameters)) {
     response->SetSuccess(Json::Value());
@@ -195,11 +224,37 @@ void SetDMZ(APIRequest *request, APIResponse *response) {
 }
 
 void GetParentalControl(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+  Json::Value result;
+  const ParentalHandler parental;
+  if (parental.LoadTimeControlData(result)) {
+    response->SetSuccess(result);
+  } else {
+    response->SetError(kErrorFailed, result);
+  }
 }
 
-void SetParentalControl(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetParentalControl(APIRequest *request, APIResponse *response) {
+  Json::Value parameters;
+  ParentalHandler parental;
+  if (!ReadRules(request, response, parameters)) {
+    return;
+  }
+  if (!parental.CheckTimeCtrlData(parameters)) {
+    response->SetError(kErrorFailed, parameters);
+    return;
+  }
+  const Json::Value &rules = parameters["rules"];
+  const auto refused = std::find_if_not(rules.begin(), rules.end(), CanBeKept);
+  if (refused != rules.end()) {
+    ROUTER_LOG("%s:%d Rule %u is refused, not all of its texts can be kept", refused.index());
+    response->SetError(kErrorFailed, Json::Value());
+    return;
+  }
+  if (parental.StopTimeCtrlRules() && parental.SetTimeCtrlConfig() && parental.StartTimeCtrlRules()) {
+    response->SetSuccess(Json::Value());
+  } else {
+    response->SetError(kErrorFailed, Json::Value());
+  }
 }
 
 void GetMacFilter(APIRequest *, APIResponse *response) {

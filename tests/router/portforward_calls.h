@@ -4,26 +4,14 @@
 
 #include "tests/router/scripted_platform.h"
 
-#include <initializer_list>
 #include <string>
-#include <vector>
 
 namespace scripted {
-
-using Lines = std::vector<std::string>;
 
 inline const std::string kFolder = "/etc/portforward/routerpf";
 inline const std::string kCheckFolder = "QARDCFileCheckDir(" + kFolder + ")";
 inline const std::string kMkdir = "QARDCExec(/bin/mkdir, -p, " + kFolder + ", null, null)";
 inline const std::string kRestart = "QARDCExec(/etc/rc.network, start-dnat, null, null, null)";
-
-inline Lines Join(std::initializer_list<Lines> parts) {
-  Lines out;
-  for (const Lines &part : parts) {
-    out.insert(out.end(), part.begin(), part.end());
-  }
-  return out;
-}
 
 } // namespace scripted
 

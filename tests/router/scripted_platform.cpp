@@ -42,6 +42,14 @@ int Call(const std::string &call, int normal) {
   return found == current->results.end() ? normal : found->second;
 }
 
+Lines Join(std::initializer_list<Lines> parts) {
+  Lines out;
+  for (const Lines &part : parts) {
+    out.insert(out.end(), part.begin(), part.end());
+  }
+  return out;
+}
+
 std::string Text(const Json::Value &value) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";

@@ -7,6 +7,7 @@
 
 #include <json/value.h>
 
+#include <initializer_list>
 #include <map>
 #include <set>
 #include <string>
@@ -15,12 +16,19 @@
 
 namespace scripted {
 
+using Lines = std::vector<std::string>;
 using Pairs = std::vector<std::pair<std::string, std::string>>;
 
 struct Lan {
   std::string name;
   std::string ip;
   std::string mask;
+};
+
+/// One section of a section file.
+struct Section {
+  std::string name;
+  Pairs pairs;
 };
 
 struct RuleRecord {
@@ -56,6 +64,8 @@ struct Platform {
   std::vector<RuleRecord> ruleFile;
   int hashes = 0; ///< made so far; the first one is "hash 0"
   int liveHashes = 0;
+  int liveLists = 0;
+  int errorCode = 0x0300;
 
   int gatewayListResult = 0;
   Json::Value gateways = Json::Value(Json::arrayValue);
@@ -67,6 +77,10 @@ struct Platform {
 
   int routeResult = 0;   ///< of the static-route call that the test makes
   Json::Value routeData; ///< what that call gives out
+
+  std::map<std::string, std::vector<Section>> sectionFiles;
+  std::vector<std::string> schedulerRecords; ///< the bytes of each one that was set
+  int slot = 0;                              ///< of the weekly schedule, now
 };
 
 /// The platform of the test that runs. Replaced by a fresh one with Reset.
@@ -76,6 +90,9 @@ void Reset();
 /// Records a call.
 /// @return what Platform::results says for it, or `normal`
 int Call(const std::string &call, int normal = 0);
+
+/// The lines of all parts, in order.
+Lines Join(std::initializer_list<Lines> parts);
 
 /// One line of JSON.
 std::string Text(const Json::Value &value);

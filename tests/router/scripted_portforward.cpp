@@ -1,8 +1,7 @@
-// The scripted platform's hashes, programs, interfaces, key/value files and rule file.
+// The scripted platform's interfaces, key/value files and rule file.
 #include "platform/netif.h"
 #include "platform/portforward.h"
-#include "platform/utility.h"
-#include "tests/router/scripted_platform.h"
+#include "tests/router/scripted_hash.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -10,12 +9,9 @@
 #include <cstring>
 
 using scripted::Call;
+using scripted::DeleteHash;
 using scripted::Get;
-
-struct QARDCSzHash {
-  std::string name;
-  scripted::Pairs pairs;
-};
+using scripted::NewHash;
 
 namespace {
 
@@ -34,58 +30,11 @@ std::string Describe(const VORNPFRecord *head) {
   return "[" + out + "]";
 }
 
-QARDCSzHash *NewHash() {
-  ++Get().liveHashes;
-  return new QARDCSzHash{"hash " + std::to_string(Get().hashes++), {}};
-}
-
-void DeleteHash(QARDCSzHash *hash) {
-  Get().liveHashes -= hash == nullptr ? 0 : 1;
-  delete hash;
-}
-
 void Copy(const std::string &text, char *to, size_t size) {
   std::snprintf(to, size, "%s", text.c_str());
 }
 
 } // namespace
-
-QARDCSzHash *QARDCSzHashAlloc(size_t size) {
-  const bool fails = Call("QARDCSzHashAlloc(" + std::to_string(size) + ")") != 0;
-  return fails ? nullptr : NewHash();
-}
-
-void QARDCSzHashFree(QARDCSzHash *hash) {
-  Call("QARDCSzHashFree(" + (hash == nullptr ? "null" : hash->name) + ")");
-  DeleteHash(hash);
-}
-
-int QARDCSzHashSetValue(QARDCSzHash *hash, const char *key, const char *value) {
-  const int result = Call("QARDCSzHashSetValue(" + hash->name + ", " + Text(key) + ", " + Text(value) + ")");
-  if (result >= 0) {
-    hash->pairs.emplace_back(key, value);
-  }
-  return result;
-}
-
-const char *QARDCSzHashGetValue(QARDCSzHash *hash, const char *key) {
-  const auto found =
-      std::find_if(hash->pairs.begin(), hash->pairs.end(), [&key](const auto &pair) { return pair.first == key; });
-  return found == hash->pairs.end() ? nullptr : found->second.c_str();
-}
-
-int QARDCExec(const char *program, const char *a1, const char *a2, const char *a3, const char *a4) {
-  return Call("QARDCExec(" + Text(program) + ", " + Text(a1) + ", " + Text(a2) + ", " + Text(a3) + ", " + Text(a4) +
-              ")");
-}
-
-int QARDCFileCheckDir(const char *path) {
-  return Call("QARDCFileCheckDir(" + Text(path) + ")", static_cast<int>(Get().folders.count(path)));
-}
-
-int QARDCSysUnlink(const char *path) {
-  return Call("QARDCSysUnlink(" + Text(path) + ")");
-}
 
 int QARDCFileGetKeyValue(const char *path, const char *key, char *value, size_t size, int flags) {
   const std::string &text = Get().keyValues[Text(path) + " " + key];
@@ -99,10 +48,6 @@ int QARDCFileGetKeyValue(const char *path, const char *key, char *value, size_t 
 int QARDCFileSetKeyValue(const char *path, const char *key, const char *value, const char *lineFormat) {
   return Call("QARDCFileSetKeyValue(" + Text(path) + ", " + key + ", " + value + ", " + lineFormat + ")",
               Get().setKeyValueResult);
-}
-
-int QARDCErrGet(void) {
-  return QARDC_ERR_NOT_FOUND;
 }
 
 const char *QARDCErrorGetFile(void) {
