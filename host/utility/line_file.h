@@ -27,6 +27,8 @@ public:
   /// @param[out] text  the next line, without its line end
   /// @return false when there is none
   bool Next(std::string_view &text);
+  /// What is still to be read.
+  std::string_view Rest() const { return rest_; }
 
 private:
   std::string_view rest_;

@@ -5,6 +5,7 @@
 #include "host/utility/atomic_file.h"
 #include "host/utility/error.h"
 #include "host/utility/line_file.h"
+#include "host/utility/section_index.h"
 #include "host/utility/sz_hash.h"
 #include "host/utility/sz_list.h"
 
@@ -69,47 +70,30 @@ int EnumSection(const char *path, QARDCSzList *sections) {
   if (path == nullptr || *path == '\0' || sections == nullptr) {
     return SetError(QARDC_ERR_BAD_ARGUMENT);
   }
-  std::string content;
-  if (vornhost::ReadWholeFile(path, content) != 0) {
+  const auto index = vornhost::ReadSections(path);
+  if (!index) {
     return -1;
   }
-  int count = 0;
-  vornhost::LineReader reader(content);
-  for (std::string_view text; reader.Next(text);) {
-    const Line line = vornhost::ParseLine(text);
-    if (line.kind == Line::Kind::kSection) {
-      sections->Append(line.key);
-      ++count;
-    }
+  for (const std::string_view name : index->Names()) {
+    sections->Append(name);
   }
-  return count;
-}
-
-// Leaves the reader behind the header of the first section of that name.
-bool SkipToSection(vornhost::LineReader &reader, std::string_view name) {
-  for (std::string_view text; reader.Next(text);) {
-    const Line line = vornhost::ParseLine(text);
-    if (line.kind == Line::Kind::kSection && line.key == name) {
-      return true;
-    }
-  }
-  return false;
+  return static_cast<int>(index->Names().size());
 }
 
 int GetSection(const char *path, const char *section, QARDCSzHash *pairs) {
   if (path == nullptr || *path == '\0' || section == nullptr || pairs == nullptr) {
     return SetError(QARDC_ERR_BAD_ARGUMENT);
   }
-  std::string content;
-  if (vornhost::ReadWholeFile(path, content) != 0) {
+  const auto index = vornhost::ReadSections(path);
+  if (!index) {
     return -1;
   }
-  vornhost::LineReader reader(content);
-  if (!SkipToSection(reader, section)) {
+  auto reader = index->Find(section);
+  if (!reader) {
     return SetError(QARDC_ERR_NOT_FOUND);
   }
   std::set<std::string_view> keys;
-  for (std::string_view text; reader.Next(text);) {
+  for (std::string_view text; reader->Next(text);) {
     const Line line = vornhost::ParseLine(text);
     if (line.kind == Line::Kind::kSection) {
       break;

@@ -5,6 +5,10 @@
 
 #include <gmock/gmock.h>
 
+#include <chrono>
+#include <memory>
+#include <thread>
+
 namespace {
 
 using hosttest::ReadText;
@@ -126,6 +130,59 @@ TEST_F(Section, NullAndEmptyArgumentsAreErrors) {
   EXPECT_TRUE(refused(QARDCFileGetSection(kPath, nullptr, hash_)));
   EXPECT_TRUE(refused(QARDCFileGetSection(kPath, "s", nullptr)));
   EXPECT_EQ(QARDCFileExist(kPath), 0);
+}
+
+// Reading keeps what it last read: it must not outlive the file's content.
+class ChangedSection : public Section {
+protected:
+  std::string Value() {
+    const std::unique_ptr<QARDCSzHash, void (*)(QARDCSzHash *)> hash(QARDCSzHashAlloc(1024), QARDCSzHashFree);
+    const int count = QARDCFileGetSection(kPath, "a", hash.get());
+    return count <= 0 ? "none" : QARDCSzHashGetValue(hash.get(), "k");
+  }
+  // Long enough ago that the next change shows in the file's times.
+  static void Settle() { std::this_thread::sleep_for(std::chrono::milliseconds(60)); }
+};
+
+TEST_F(ChangedSection, IsReadAsItIsNowWhoeverChangedIt) {
+  WriteText(kPath, "[a]\nk=1\n");
+  Settle();
+  EXPECT_EQ(Value(), "1");
+  EXPECT_EQ(Value(), "1");
+  WriteText(kPath, "[a]\nk=2\n"); // in place, of the same size
+  EXPECT_EQ(Value(), "2");
+  Settle();
+  EXPECT_EQ(Value(), "2");
+  WriteText("/etc/sections/other", "[a]\nk=3\n");
+  std::filesystem::rename("/etc/sections/other", kPath);
+  EXPECT_EQ(Value(), "3");
+  Settle();
+  EXPECT_EQ(Value(), "3");
+  std::filesystem::remove(kPath);
+  EXPECT_EQ(Value(), "none");
+  WriteText(kPath, "[a]\nk=4\n");
+  EXPECT_EQ(Value(), "4");
+}
+
+TEST_F(ChangedSection, IsReadAsItIsNowWhenItChangesFasterThanFileTimes) {
+  WriteText(kPath, "[a]\nk=0\n");
+  Settle();
+  for (int round = 0; round < 3000; ++round) {
+    const std::string value = std::to_string(round % 10);
+    WriteText(kPath, "[a]\nk=" + value + "\n");
+    ASSERT_EQ(Value(), value) << round;
+    ASSERT_EQ(Value(), value) << round;
+  }
+}
+
+TEST_F(ChangedSection, OfAnotherPathIsAnothers) {
+  WriteText(kPath, "[a]\nk=1\n");
+  WriteText("/etc/sections/other", "[a]\nk=2\n");
+  Settle();
+  EXPECT_EQ(Value(), "1");
+  ASSERT_GE(QARDCFileGetSection("/etc/sections/other", "a", hash_), 0);
+  EXPECT_EQ(Pairs(), "k=2;");
+  EXPECT_EQ(Value(), "1");
 }
 
 } // namespace
