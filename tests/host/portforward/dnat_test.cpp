@@ -1,6 +1,6 @@
 // From the files to the kernel's table.
+#include "host/nftables/nftables.h"
 #include "host/portforward/dnat.h"
-#include "host/portforward/nftables.h"
 #include "platform/portforward.h"
 #include "tests/host/files.h"
 #include "tests/host/network/shell.h"

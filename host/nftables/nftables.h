@@ -1,6 +1,8 @@
 // The kernel's nftables, through libnftables: the same language and the same transactions as nft(8), in this process.
-#ifndef HOST_PORTFORWARD_NFTABLES_H
-#define HOST_PORTFORWARD_NFTABLES_H
+#ifndef HOST_NFTABLES_NFTABLES_H
+#define HOST_NFTABLES_NFTABLES_H
+
+#include <json/value.h>
 
 #include <memory>
 #include <set>
@@ -19,6 +21,12 @@ public:
   /// Runs commands as one transaction: all of them, or none.
   /// @return false with the cause in the system log
   bool Run(const std::string &commands);
+
+  /// @param[in]  what   "table inet name", "set inet table name" and the like
+  /// @param[out] items  what the kernel has of it, as libnftables-json(5) says; an empty array when there is no such
+  /// thing
+  /// @return false when the kernel's answer cannot be read
+  bool List(const std::string &what, Json::Value &items);
 
   /// @param[out] comments  those of the rules of one table; none when there is no such table
   /// @return false when the kernel's answer cannot be read

@@ -1,4 +1,4 @@
-#include "host/portforward/nftables.h"
+#include "host/nftables/nftables.h"
 
 #include "host/utility/log.h"
 
@@ -31,10 +31,10 @@ bool Nftables::Run(const std::string &commands) {
   return done;
 }
 
-bool Nftables::ReadComments(const std::string &table, std::set<std::string> &comments) {
-  comments.clear();
+bool Nftables::List(const std::string &what, Json::Value &items) {
+  items = Json::Value(Json::arrayValue);
   nft_ctx_output_set_flags(context_.get(), NFT_CTX_OUTPUT_JSON);
-  const bool listed = nft_run_cmd_from_buffer(context_.get(), ("list table " + table).c_str()) == 0;
+  const bool listed = nft_run_cmd_from_buffer(context_.get(), ("list " + what).c_str()) == 0;
   const char *text = nft_ctx_get_output_buffer(context_.get());
   const std::string output = text == nullptr ? "" : text;
   const char *errors = nft_ctx_get_error_buffer(context_.get());
@@ -47,7 +47,17 @@ bool Nftables::ReadComments(const std::string &table, std::set<std::string> &com
   if (!reader.parse(output, answer, false) || !answer["nftables"].isArray()) {
     return false;
   }
-  for (const Json::Value &item : answer["nftables"]) {
+  items = answer["nftables"];
+  return true;
+}
+
+bool Nftables::ReadComments(const std::string &table, std::set<std::string> &comments) {
+  comments.clear();
+  Json::Value items;
+  if (!List("table " + table, items)) {
+    return false;
+  }
+  for (const Json::Value &item : items) {
     const Json::Value &comment = item["rule"]["comment"];
     if (comment.isString()) {
       comments.insert(comment.asString());
