@@ -29,6 +29,7 @@ start() {
   cp "$GROUND/ca.pem" /etc/vorn/packageserver-ca.pem # the provider has made it by now
   launch syslogd busybox syslogd -n -S -O "$LOG/syslog"
   while [ ! -S /run/dev-log ]; do sleep 0.005; done
+  /usr/vorn/sbin/vorntimecontrol --restore
   /usr/vorn/sbin/vorntopology start
   launch vornroutes /usr/vorn/sbin/vornroutes watch # as vorn-routes.service does
   ip address add 2001:db8:2::1/64 dev lbr0 # the provider routes this prefix here; a switch takes it away with lbr0

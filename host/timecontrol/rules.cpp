@@ -1,0 +1,140 @@
+#include "host/timecontrol/rules.h"
+
+#include "host/schedule/local_time.h"
+#include "host/utility/atomic_file.h"
+#include "host/utility/line_file.h"
+#include "host/utility/log.h"
+
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <cstring>
+
+namespace vornhost {
+
+namespace {
+
+constexpr char kRuleFile[] = "/tmp/timectrl.conf";
+
+struct Section {
+  std::string name;
+  std::string clientName;
+  std::optional<std::string> schedule;
+};
+
+std::vector<Section> ParseSections(const std::string &content) {
+  std::vector<Section> sections;
+  LineReader reader(content);
+  for (std::string_view text; reader.Next(text);) {
+    const Line line = ParseLine(text);
+    if (line.kind == Line::Kind::kSection) {
+      sections.push_back({std::string(line.key), {}, {}});
+    } else if (line.kind == Line::Kind::kPair && !sections.empty()) {
+      if (line.key == "name") {
+        sections.back().clientName = line.value;
+      } else if (line.key == "tc_sched") {
+        sections.back().schedule = line.value;
+      }
+    }
+  }
+  return sections;
+}
+
+std::optional<TimeRule> MakeRule(const Section &section) {
+  const std::string shown = LogText(section.name);
+  const auto mac = CanonicalMac(section.name);
+  if (!mac) {
+    LogError("time control: rule [%s] is left out: not the address of a device", shown.c_str());
+    return {};
+  }
+  if (!section.schedule) {
+    LogError("time control: rule [%s] is left out: it has no schedule", shown.c_str());
+    return {};
+  }
+  if (section.schedule->size() != kSlots) {
+    LogError("time control: rule [%s] has %zu slots, not %d: a missing one is free, what is beyond is not used",
+             shown.c_str(), section.schedule->size(), kSlots);
+  }
+  return TimeRule{*mac, section.clientName, *section.schedule};
+}
+
+int HexValue(char digit) {
+  if (digit >= '0' && digit <= '9') {
+    return digit - '0';
+  }
+  if (digit >= 'a' && digit <= 'f') {
+    return digit - 'a' + 10;
+  }
+  return digit >= 'A' && digit <= 'F' ? digit - 'A' + 10 : -1;
+}
+
+bool IsRootsFile(const char *path) {
+  struct stat info {};
+  return lstat(path, &info) == 0 && S_ISREG(info.st_mode) && info.st_uid == 0 &&
+         (info.st_mode & (S_IWGRP | S_IWOTH)) == 0;
+}
+
+} // namespace
+
+std::optional<std::string> CanonicalMac(std::string_view text) {
+  constexpr size_t kLength = 17;
+  if (text.size() != kLength || (text[2] != ':' && text[2] != '-')) {
+    return {};
+  }
+  std::string mac(text);
+  bool isZero = true;
+  for (size_t at = 0; at < kLength; ++at) {
+    if (at % 3 == 2) {
+      if (text[at] != text[2]) {
+        return {};
+      }
+      mac[at] = ':';
+      continue;
+    }
+    const int value = HexValue(text[at]);
+    if (value < 0) {
+      return {};
+    }
+    mac[at] = "0123456789abcdef"[value];
+    isZero = isZero && value == 0;
+  }
+  const bool isGroup = HexValue(mac[1]) % 2 != 0;
+  return isZero || isGroup ? std::nullopt : std::optional(mac);
+}
+
+bool IsMarked(const std::string &schedule, int slot) {
+  return slot >= 0 && static_cast<size_t>(slot) < schedule.size() && schedule[static_cast<size_t>(slot)] == '1';
+}
+
+std::vector<TimeRule> ParseRules(const std::string &content) {
+  std::vector<TimeRule> rules;
+  for (const Section &section : ParseSections(content)) {
+    if (auto rule = MakeRule(section)) {
+      rules.push_back(std::move(*rule));
+    }
+  }
+  return rules;
+}
+
+int ReadRules(std::vector<TimeRule> &rules) {
+  std::string content;
+  // Nobody can put another file in the place of root's own: the folder is sticky.
+  if (!IsRootsFile(kRuleFile) || ReadWholeFile(kRuleFile, content) != 0) {
+    LogError("time control: %s cannot be read, or is not root's alone", kRuleFile);
+    return -1;
+  }
+  rules = ParseRules(content);
+  return 0;
+}
+
+MacSet CutIn(int slot, const std::vector<TimeRule> &rules) {
+  MacSet cut;
+  for (const TimeRule &rule : rules) {
+    if (IsMarked(rule.schedule, slot)) {
+      cut.insert(rule.mac);
+    }
+  }
+  return cut;
+}
+
+} // namespace vornhost
