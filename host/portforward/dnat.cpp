@@ -121,7 +121,7 @@ std::optional<Plan> ReadPlan() {
 
 // @return the lock, held until it is closed; closed when it cannot be had
 UniqueFd TakeTurn() {
-  if (mkdir(kRunFolder, 0755) != 0 && errno != EEXIST) {
+  if (mkdir(kRunFolder, 0700) != 0 && errno != EEXIST) { // whoever could open it could hold every change up
     LogError("%s: %s", kRunFolder, std::strerror(errno));
     return UniqueFd();
   }

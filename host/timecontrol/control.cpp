@@ -22,12 +22,13 @@ namespace vornhost {
 
 namespace {
 
-// Locked by whoever changes something; not empty while enforcement is on. /run is empty after a restart.
+// Locked by whoever changes something, which nobody but root may hold up; not empty while enforcement is on. /run is
+// empty after a restart.
 constexpr char kStateFile[] = "/run/vorntimecontrol.state";
 
 class State {
 public:
-  State() : file_(open(kStateFile, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644)) {
+  State() : file_(open(kStateFile, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600)) {
     int locked = -1;
     do {
       locked = file_.IsOpen() ? flock(file_.Get(), LOCK_EX) : 0;
