@@ -62,7 +62,7 @@ bool GatewayList::Get(const std::string &family, const std::string &filter, Json
     ROUTER_LOG("%s:%d Failed to get gateway list");
     return false;
   }
-  vornnetwork::network::FilterList(filter, list);
+  vornnetwork::network::FilterList(filter, list); // one that it does not know leaves the list as it is: no failure
   result["configs"] = list;
   return true;
 }

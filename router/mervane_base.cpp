@@ -276,8 +276,8 @@ void GetGatewayList(APIRequest *request, APIResponse *response) {
     response->SetError(kErrorParameter, Json::Value());
     return;
   }
-  const auto family = router::TextOf(request->GetParam("iptype", Json::Value()));
-  const auto filter = router::TextOf(request->GetParam("type", Json::Value()));
+  const auto family = router::WholeTextOf(request->GetParam("iptype", Json::Value()));
+  const auto filter = router::WholeTextOf(request->GetParam("type", Json::Value()));
   if (!family || !filter) {
     response->SetError(kErrorParameter, Json::Value());
     return;
@@ -299,8 +299,9 @@ void SetGatewayList(APIRequest *request, APIResponse *response) {
   if (request->HasParam("ifnames")) {
     names = request->GetParam("ifnames", Json::Value());
   }
-  const auto family = router::TextOf(request->GetParam("iptype", Json::Value()));
-  if (!family || !(names.isNull() || router::IsTextList(names))) {
+  const auto family = router::WholeTextOf(request->GetParam("iptype", Json::Value()));
+  // A name given twice has no one place in the order; found by the daemon it would be found half-way.
+  if (!family || !(names.isNull() || router::IsTextSet(names))) {
     response->SetError(kErrorParameter, Json::Value());
     return;
   }
@@ -341,6 +342,7 @@ bool ReadRouteRequest(APIRequest *request, APIResponse *response, const char *li
     AnswerRouteFault(response, kNoType);
     return false;
   }
+  // One of another JSON type is no list: refused as a missing one is.
   if (list != nullptr && parameters[list].type() != listType) {
     AnswerRouteFault(response, kNoRules);
     return false;

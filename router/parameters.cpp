@@ -3,6 +3,7 @@
 #include <json/reader.h>
 
 #include <algorithm>
+#include <set>
 
 namespace router {
 
@@ -104,11 +105,13 @@ bool ParseJsonText(const Json::Value &parameter, Json::Value &value, std::string
   return ParseJson(*text, value, errors);
 }
 
-bool IsTextList(const Json::Value &value) {
-  const auto isWholeText = [](const Json::Value &element) {
-    return element.isString() && element.asString().find('\0') == std::string::npos;
+bool IsTextSet(const Json::Value &value) {
+  std::set<std::string> known;
+  const auto isNewText = [&known](const Json::Value &element) {
+    const auto text = WholeTextOf(element);
+    return text && known.insert(*text).second;
   };
-  return value.isArray() && std::all_of(value.begin(), value.end(), isWholeText);
+  return value.isArray() && std::all_of(value.begin(), value.end(), isNewText);
 }
 
 } // namespace router

@@ -35,8 +35,8 @@ std::optional<bool> ConvertToBool(const Json::Value &value);
 /// @return the member of that name; null when there is none or the value is no object
 const Json::Value &MemberOf(const Json::Value &value, const char *name);
 
-/// @return whether the value is an array of texts that a C function would read to their end
-bool IsTextList(const Json::Value &value);
+/// @return whether the value is an array of texts that a C function would read to their end, no two of them the same
+bool IsTextSet(const Json::Value &value);
 
 /// Reads JSON that came inside a text. Arrays and objects may be nested 64 deep, as in a request's body: the reader
 /// recurses and takes no limit that would fit a small stack.

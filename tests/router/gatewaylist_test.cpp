@@ -5,11 +5,15 @@
 
 #include <gmock/gmock.h>
 
+#include <type_traits>
+
 using scripted::Exchange;
 using scripted::Get;
 using scripted::Parse;
 using testing::ElementsAre;
 using testing::IsEmpty;
+
+static_assert(std::is_empty_v<GatewayList> && !std::is_polymorphic_v<GatewayList>);
 
 namespace {
 
@@ -76,6 +80,22 @@ TEST_F(GatewayListTest, Get_ParameterThatIsNoTextAnswers4302) {
   }
 }
 
+TEST_F(GatewayListTest, GetAndSet_TextWithANulAnswers4302) {
+  for (const char *text : {R"({"iptype":"ipv4\u0000","type":"all"})", R"({"iptype":"ipv4","type":"all\u0000x"})"}) {
+    Get().calls.clear();
+    Exchange exchange(Parse(text));
+    exchange.Run(GetGatewayList);
+    EXPECT_THAT(Get().calls, ElementsAre("HasParam(iptype)", "HasParam(type)", "GetParam(iptype, null)",
+                                         "GetParam(type, null)", "SetError(4302, null)"))
+        << text;
+  }
+  Get().calls.clear();
+  Exchange exchange(Parse(R"({"iptype":"ipv4\u0000"})"));
+  exchange.Run(SetGatewayList);
+  EXPECT_THAT(Get().calls,
+              ElementsAre("HasParam(iptype)", "HasParam(ifnames)", "GetParam(iptype, null)", "SetError(4302, null)"));
+}
+
 TEST_F(GatewayListTest, Get_DaemonThatCannotListAnswers4300WithNull) {
   Get().gatewayListResult = -1;
   Exchange exchange(Parse(R"({"iptype":"ipv4","type":"all"})"));
@@ -128,6 +148,34 @@ TEST_F(GatewayListTest, Set_UnknownFamilyHasAnEmptyTypeAndAnEmptyFileName) {
                           R"(RefreshGateway({"type":""}))", "~NetClient()", "SetSuccess(null)"));
 }
 
+TEST_F(GatewayListTest, Set_UnknownFamilyWithARefusedRecordAnswersTheList) {
+  Get().addGatewayResults = {-1};
+  Exchange exchange(Parse(R"({"iptype":"ipx","ifnames":["eth1"]})"));
+  exchange.Run(SetGatewayList);
+  EXPECT_THAT(Get().calls,
+              ElementsAre("HasParam(iptype)", "HasParam(ifnames)", "GetParam(ifnames, null)", "GetParam(iptype, null)",
+                          "NetClient()", Record("", 0, R"("eth1")"), "~NetClient()", R"(SetError(4300, ["eth1"]))"));
+  EXPECT_THAT(Get().log, ElementsAre("gatewaylist: Failed to add gateway info for []"));
+}
+
+TEST_F(GatewayListTest, Set_UnknownFamilyWithARefusedRefreshAnswersTheList) {
+  Get().refreshResult = -1;
+  Exchange exchange(Parse(R"({"iptype":"ipx","ifnames":["eth1"]})"));
+  exchange.Run(SetGatewayList);
+  EXPECT_THAT(Get().calls,
+              ElementsAre("HasParam(iptype)", "HasParam(ifnames)", "GetParam(ifnames, null)", "GetParam(iptype, null)",
+                          "NetClient()", Record("", 0, R"("eth1")"), "QARDCFileSetKeyValue(, DEVICE, eth1, %s=%s\n)",
+                          R"(RefreshGateway({"type":""}))", "~NetClient()", R"(SetError(4300, ["eth1"]))"));
+  EXPECT_THAT(Get().log, ElementsAre("gatewaylist: Failed to refresh default gateway"));
+}
+
+TEST_F(GatewayListTest, Set_UnknownFamilyWithoutAListOnlyRefreshesWithAnEmptyType) {
+  Exchange exchange(Parse(R"({"iptype":"ipx"})"));
+  exchange.Run(SetGatewayList);
+  EXPECT_THAT(Get().calls, ElementsAre("HasParam(iptype)", "HasParam(ifnames)", "GetParam(iptype, null)", "NetClient()",
+                                       R"(RefreshGateway({"type":""}))", "~NetClient()", "SetSuccess(null)"));
+}
+
 TEST_F(GatewayListTest, Set_WithoutAListOnlyRefreshes) {
   Exchange absent(Parse(R"({"iptype":"ipv4"})"));
   absent.Run(SetGatewayList);
@@ -165,6 +213,18 @@ TEST_F(GatewayListTest, Set_WrongTypesAnswer4302AndStoreNothing) {
         << wrong;
     EXPECT_THAT(Get().log, IsEmpty());
   }
+}
+
+TEST_F(GatewayListTest, Set_RepeatedNameAnswers4302BeforeTheFirstRecord) {
+  for (const char *names : {R"(["eth1","eth1"])", R"(["eth0","eth1","eth0"])"}) {
+    Get().calls.clear();
+    Exchange exchange(Parse(std::string(R"({"iptype":"ipv4","ifnames":)") + names + "}"));
+    exchange.Run(SetGatewayList);
+    EXPECT_THAT(Get().calls, ElementsAre("HasParam(iptype)", "HasParam(ifnames)", "GetParam(ifnames, null)",
+                                         "GetParam(iptype, null)", "SetError(4302, null)"))
+        << names;
+  }
+  EXPECT_THAT(Get().log, IsEmpty());
 }
 
 TEST_F(GatewayListTest, Set_RefusedFirstRecordWritesNoFileAndRefreshesNothing) {

@@ -104,6 +104,12 @@ TEST_F(StaticRouteTest, Set_HandsTheListOverAsItIs) {
   EXPECT_THAT(Get().log, IsEmpty());
 }
 
+TEST_F(StaticRouteTest, Set_AnswersSuccessWithANullPayload) {
+  Get().routeResult = 5;
+  EXPECT_THAT(Call(SetStaticRouteRules, R"({"type":"ipv4","rules":[{"ip":"10.0.0.0"}]})"),
+              Calls(R"(SetRules(0, [{"ip":"10.0.0.0"}]))", "SetSuccess(null)"));
+}
+
 TEST_F(StaticRouteTest, Set_RefusedListAnswers4300WithNull) {
   Get().routeResult = -1;
   EXPECT_THAT(Call(SetStaticRouteRules, R"({"type":"ipv6","rules":[]})"),
