@@ -6,6 +6,7 @@
 #include "platform/network.h"
 
 #include "host/routes/route_follower.h"
+#include "host/utility/log.h"
 
 #include <json/writer.h>
 #include <syslog.h>
@@ -18,10 +19,11 @@
 namespace {
 
 int Restore() {
-  const std::vector<std::string> failures = vornhost::RouteFollower().Apply();
+  const std::vector<std::string> failures = vornhost::RestoreRoutes();
   for (const std::string &failure : failures) {
-    syslog(LOG_ERR, "routes: %s", failure.c_str());
-    std::fprintf(stderr, "vornroutes: %s\n", failure.c_str());
+    const std::string text = vornhost::LogText(failure);
+    vornhost::LogError("routes: %s", text.c_str());
+    std::fprintf(stderr, "vornroutes: %s\n", text.c_str());
   }
   return failures.empty() ? 0 : 1;
 }
@@ -58,8 +60,9 @@ int main(int argc, char **argv) {
   try {
     result = argc == 2 ? Run(argv[1]) : 2;
   } catch (const std::exception &error) {
-    syslog(LOG_ERR, "%s", error.what());
-    std::fprintf(stderr, "vornroutes: %s\n", error.what());
+    const std::string text = vornhost::LogText(error.what());
+    vornhost::LogError("%s", text.c_str());
+    std::fprintf(stderr, "vornroutes: %s\n", text.c_str());
     return 1;
   }
   if (result == 2) {

@@ -82,6 +82,7 @@ Address AddressOf(rtnl_addr *address) {
   out.family = rtnl_addr_get_family(address);
   out.text = Text(rtnl_addr_get_local(address));
   out.broadcast = Text(rtnl_addr_get_broadcast(address));
+  out.peer = Text(rtnl_addr_get_peer(address));
   out.scope = rtnl_addr_get_scope(address);
   out.flags = rtnl_addr_get_flags(address);
   if ((out.flags & IFA_F_PERMANENT) == 0) {
@@ -91,18 +92,17 @@ Address AddressOf(rtnl_addr *address) {
   return out;
 }
 
-bool IsOfKind(rtnl_route *route) {
-  return rtnl_route_get_type(route) == RTN_UNICAST && rtnl_route_get_nnexthops(route) == 1;
+bool IsUnicast(rtnl_route *route) {
+  return rtnl_route_get_type(route) == RTN_UNICAST;
 }
 
 bool IsKept(rtnl_route *route) {
   const uint8_t protocol = rtnl_route_get_protocol(route);
-  return rtnl_route_get_table(route) != RT_TABLE_LOCAL && IsOfKind(route) && protocol != RTPROT_KERNEL &&
-         protocol != RTPROT_RA;
+  return rtnl_route_get_table(route) != RT_TABLE_LOCAL && IsUnicast(route) && rtnl_route_get_nnexthops(route) == 1 &&
+         protocol != RTPROT_KERNEL && protocol != RTPROT_RA;
 }
 
-Route RouteOf(rtnl_route *route) {
-  rtnl_nexthop *hop = rtnl_route_nexthop_n(route, 0);
+Route RouteOf(rtnl_route *route, rtnl_nexthop *hop) {
   Route out;
   out.index = rtnl_route_nh_get_ifindex(hop);
   out.family = rtnl_route_get_family(route);
@@ -114,6 +114,7 @@ Route RouteOf(rtnl_route *route) {
   out.protocol = rtnl_route_get_protocol(route);
   out.scope = rtnl_route_get_scope(route);
   out.hopFlags = rtnl_route_nh_get_flags(hop) & RTNH_F_ONLINK;
+  out.isOneOfMany = rtnl_route_get_nnexthops(route) > 1;
   return out;
 }
 
@@ -127,11 +128,23 @@ int CollectRoute(nl_msg *message, void *context) {
   rtnl_route *raw = nullptr;
   if (rtnl_route_parse(nlmsg_hdr(message), &raw) == 0) {
     const std::unique_ptr<rtnl_route, void (*)(rtnl_route *)> route(raw, rtnl_route_put);
-    if (collector->isWanted(raw)) {
-      collector->routes.push_back(RouteOf(raw));
+    const int hops = collector->isWanted(raw) ? rtnl_route_get_nnexthops(raw) : 0;
+    for (int at = 0; at < hops; ++at) {
+      collector->routes.push_back(RouteOf(raw, rtnl_route_nexthop_n(raw, at)));
     }
   }
   return NL_OK;
+}
+
+// @param[in] code  an errno that says that there is nothing to do
+template <typename Change> void Tolerate(int code, const Change &change) {
+  try {
+    change();
+  } catch (const NetlinkError &error) {
+    if (error.GetCode() != code) {
+      throw;
+    }
+  }
 }
 
 int KeepErrno(sockaddr_nl *, nlmsgerr *error, void *code) {
@@ -302,7 +315,7 @@ std::vector<Route> Netlink::Routes() {
 
 std::vector<Route> Netlink::RoutesOf(int family, uint32_t table) {
   return DumpRoutes(family,
-                    [table](rtnl_route *route) { return rtnl_route_get_table(route) == table && IsOfKind(route); });
+                    [table](rtnl_route *route) { return rtnl_route_get_table(route) == table && IsUnicast(route); });
 }
 
 void Netlink::Send(Message &message, const std::string &what) {
@@ -401,23 +414,12 @@ void Netlink::ChangeAddress(const Address &address, int type, int flags) {
 }
 
 void Netlink::AddAddress(const Address &address) {
-  try {
-    ChangeAddress(address, RTM_NEWADDR, NLM_F_CREATE | NLM_F_EXCL);
-  } catch (const NetlinkError &error) {
-    if (error.GetCode() != EEXIST) {
-      throw;
-    }
-  }
+  Tolerate(EEXIST, [&] { ChangeAddress(address, RTM_NEWADDR, NLM_F_CREATE | NLM_F_EXCL); });
 }
 
 void Netlink::DeleteAddress(const Address &address) {
-  try {
-    ChangeAddress(address, RTM_DELADDR, 0);
-  } catch (const NetlinkError &error) {
-    if (error.GetCode() != EADDRNOTAVAIL) { // secondary addresses go with their primary one
-      throw;
-    }
-  }
+  // Secondary addresses go with their primary one.
+  Tolerate(EADDRNOTAVAIL, [&] { ChangeAddress(address, RTM_DELADDR, 0); });
 }
 
 void Netlink::ChangeRoute(const Route &route, int type, int flags) {
@@ -454,17 +456,15 @@ void Netlink::ChangeRoute(const Route &route, int type, int flags) {
 }
 
 void Netlink::AddRoute(const Route &route) {
-  try {
-    InsertRoute(route);
-  } catch (const NetlinkError &error) {
-    if (error.GetCode() != EEXIST) {
-      throw;
-    }
-  }
+  Tolerate(EEXIST, [&] { InsertRoute(route); });
 }
 
 void Netlink::InsertRoute(const Route &route) {
   ChangeRoute(route, RTM_NEWROUTE, NLM_F_CREATE | NLM_F_EXCL);
+}
+
+void Netlink::AppendRoute(const Route &route) {
+  Tolerate(EEXIST, [&] { ChangeRoute(route, RTM_NEWROUTE, NLM_F_CREATE | NLM_F_APPEND); });
 }
 
 void Netlink::ReplaceRoute(const Route &route) {
@@ -472,13 +472,7 @@ void Netlink::ReplaceRoute(const Route &route) {
 }
 
 void Netlink::DeleteRoute(const Route &route) {
-  try {
-    ChangeRoute(route, RTM_DELROUTE, 0);
-  } catch (const NetlinkError &error) {
-    if (error.GetCode() != ESRCH) {
-      throw;
-    }
-  }
+  Tolerate(ESRCH, [&] { ChangeRoute(route, RTM_DELROUTE, 0); });
 }
 
 } // namespace vornhost

@@ -36,6 +36,7 @@ struct Address {
   int family = 0;
   std::string text; ///< with prefix length, as "192.168.1.1/24"; without one it is a host's
   std::string broadcast;
+  std::string peer; ///< with prefix length: what is on the link instead of the address's own subnet; empty: none
   int scope = 0;
   uint32_t flags = 0;
   uint32_t validSeconds = UINT32_MAX; ///< UINT32_MAX: for ever
@@ -46,7 +47,7 @@ struct Address {
   std::string Host() const;
 };
 
-/// A unicast route over one next hop.
+/// A unicast route over one next hop, or one hop of a route that has several.
 struct Route {
   int index = 0; ///< of the link that it goes out of
   int family = 0;
@@ -57,7 +58,8 @@ struct Route {
   uint32_t table = 0;
   int protocol = 0;
   int scope = 0;
-  uint32_t hopFlags = 0; ///< RTNH_F_ONLINK
+  uint32_t hopFlags = 0;    ///< RTNH_F_ONLINK
+  bool isOneOfMany = false; ///< there are other hops; all are listed under the first one's protocol
 };
 
 /// The kernel refused or could not be asked.
@@ -84,7 +86,7 @@ public:
   std::vector<Address> Addresses();
   /// Those of every table but the local one; without those that the kernel itself makes or that a router advertises.
   std::vector<Route> Routes();
-  /// Those of one table and family, whoever made them.
+  /// Those of one table and family, whoever made them, in the kernel's order; those of several hops hop by hop.
   std::vector<Route> RoutesOf(int family, uint32_t table);
 
   /// Makes a bridge that forwards at once (no spanning tree, no delay), still down.
@@ -104,6 +106,8 @@ public:
   void AddRoute(const Route &route);
   /// One that is there already, be it another's, is EEXIST.
   void InsertRoute(const Route &route);
+  /// Behind those to the same destination with the same metric. One that is there already is no error.
+  void AppendRoute(const Route &route);
   /// Takes the place of the route to the same destination with the same metric, in one step.
   void ReplaceRoute(const Route &route);
   /// One that is not there any more is no error.

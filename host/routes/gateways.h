@@ -10,6 +10,8 @@
 
 #include "host/network/netlink.h"
 
+#include <functional>
+#include <optional>
 #include <set>
 #include <string>
 #include <vector>
@@ -19,8 +21,9 @@ namespace vornhost {
 /// RTA_PROTOCOL of the copies of advertised default routes.
 constexpr int kGatewayProtocol = 87;
 
-/// No order is longer.
-constexpr size_t kGatewayLimit = 64;
+/// Interfaces whose link came back a moment ago. They go behind those that have had theirs for longer; nothing: whoever
+/// asks does not follow the links, and what was put behind the others stays there.
+using Settling = std::optional<std::set<std::string>>;
 
 struct Gateway {
   std::string ifname;
@@ -41,21 +44,30 @@ public:
   /// Those of the order, then other interfaces that have a default route.
   std::vector<Gateway> List();
 
-  /// Puts an interface at a place of the order; those from there on move back. The caller has the routes' turn.
-  /// @return false for what cannot be an order: a place behind the end, or an interface that has a place before it
-  bool Place(const std::string &ifname, size_t position);
+  /// Puts an interface at a place of the order, wherever it was before; those from there on move back, and what is then
+  /// behind the longest order leaves it. So of two who store an order at once the last to speak of an interface is
+  /// right, and neither is refused for what the other said. The caller has the routes' turn.
+  /// @return why it cannot have the place; nothing when it was stored
+  std::optional<std::string> Place(const std::string &ifname, size_t position);
 
   /// Makes the kernel's default routes follow the order; when the kernel refuses one, all are put back and NetlinkError
   /// is thrown. The caller has the routes' turn.
-  /// @param[in] settling  interfaces whose link has just come back: behind those that have had theirs for longer
-  void Refresh(const std::set<std::string> &settling = {});
+  void Refresh();
+
+  /// The same, each interface for itself: one whose route the kernel refuses keeps what it has and costs no other. The
+  /// caller has the routes' turn.
+  /// @param[in] links  those that `settling` was found in
+  /// @return what the kernel refused, a text for each
+  std::vector<std::string> Follow(std::vector<Link> links, const Settling &settling);
 
 private:
   struct Scene;
+  using Refused = std::function<void(const NetlinkError &error)>;
 
-  Scene Look();
+  Scene Look(std::vector<Link> links);
   std::vector<Route> Defaults();
-  std::vector<Route> Wanted(const Scene &scene, const std::set<std::string> &settling) const;
+  std::vector<Route> Wanted(const Scene &scene, const Settling &settling) const;
+  void Change(const std::vector<Route> &before, const std::vector<Route> &wanted, const Refused &refused);
   void Restore(const std::vector<Route> &before);
 
   Netlink &netlink_;

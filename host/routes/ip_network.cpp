@@ -3,6 +3,7 @@
 #include <arpa/inet.h>
 
 #include <algorithm>
+#include <charconv>
 
 namespace vornhost {
 
@@ -14,6 +15,18 @@ std::optional<IpNetwork> IpNetwork::Parse(const std::string &text, int family) {
     return std::nullopt;
   }
   return out;
+}
+
+std::optional<IpNetwork> IpNetwork::ParseSubnet(const std::string &text, int family) {
+  const size_t slash = std::min(text.find('/'), text.size());
+  const auto address = Parse(text.substr(0, slash), family);
+  int length = address ? address->GetBits() : 0;
+  const char *end = text.data() + text.size();
+  if (slash < text.size() && std::from_chars(text.data() + slash + 1, end, length).ptr != end) {
+    return std::nullopt;
+  }
+  return address && length >= 0 && length <= address->GetBits() ? std::optional(address->WithLength(length))
+                                                                : std::nullopt;
 }
 
 IpNetwork IpNetwork::WithLength(int length) const {
@@ -42,6 +55,19 @@ bool IpNetwork::HasHostBits() const {
 
 bool IpNetwork::Contains(const IpNetwork &other) const {
   return family_ == other.family_ && length_ <= other.length_ && Masked(length_) == other.Masked(length_);
+}
+
+bool IpNetwork::IsEdge(const IpNetwork &address) const {
+  if (family_ != AF_INET || length_ > 30 || !Contains(address)) {
+    return false;
+  }
+  const auto low = Masked(length_);
+  auto high = bytes_;
+  for (size_t at = 0; at < 4; ++at) {
+    const int kept = std::clamp(length_ - static_cast<int>(at) * 8, 0, 8);
+    high[at] = static_cast<unsigned char>(low[at] | 0xffU >> kept);
+  }
+  return address.bytes_ == low || address.bytes_ == high;
 }
 
 std::string IpNetwork::GetAddressText() const {

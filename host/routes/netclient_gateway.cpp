@@ -15,6 +15,9 @@ class VORN_EXPORT NetClient;
 
 #include <sys/socket.h>
 
+#include <optional>
+#include <stdexcept>
+
 namespace vornnetwork::dbus {
 
 namespace {
@@ -56,10 +59,30 @@ void AppendRecords(Netlink &netlink, const Family &family, Json::Value &list) {
 }
 
 // Gateways and name servers come from an interface's own configuration, which "NULL" stands for, and from nowhere else.
-bool IsRecord(const Json::Value &record) {
-  return FamilyOf(record) != nullptr && record["ifname"].isString() &&
-         vornhost::IsRoutableName(record["ifname"].asString()) && record["priority"].isUInt() &&
-         record["gateway"] == Json::Value("NULL") && record["dns"] == Json::Value("NULL");
+// @return why it is no record; nothing when it is one
+std::optional<std::string> FaultOf(const Json::Value &record) {
+  if (!record["ifname"].isString() || !vornhost::IsRoutableName(record["ifname"].asString())) {
+    return "no interface name";
+  }
+  if (!record["priority"].isUInt()) {
+    return "its priority is no place";
+  }
+  if (record["gateway"] != Json::Value("NULL") || record["dns"] != Json::Value("NULL")) {
+    return "gateway and name server come from the interface's own configuration";
+  }
+  return std::nullopt;
+}
+
+// @return why it was not stored; nothing when it was
+std::optional<std::string> Store(Gateways &gateways, const Json::Value &record) {
+  if (auto fault = FaultOf(record)) {
+    return fault;
+  }
+  try {
+    return gateways.Place(record["ifname"].asString(), record["priority"].asUInt());
+  } catch (const std::runtime_error &error) {
+    return error.what();
+  }
 }
 
 } // namespace
@@ -72,6 +95,7 @@ int NetClient::GetGatewayListData(const Json::Value &request, Json::Value &list)
   return vornhost::AnswerFor("gateways cannot be listed", [&] {
     const Family *asked = FamilyOf(request);
     if (asked == nullptr && !request.isNull()) {
+      LogError("gateways not listed: unknown type");
       return false;
     }
     Json::Value records(Json::arrayValue);
@@ -86,21 +110,25 @@ int NetClient::GetGatewayListData(const Json::Value &request, Json::Value &list)
   });
 }
 
+// A refused record ends a new order half-way: what was stored of it stays, and nobody asks for a refresh. The kernel is
+// made to follow right here, so that it and the file agree.
 int NetClient::AddGatewayData(const Json::Value &record) {
   return vornhost::AnswerFor("a gateway cannot be stored", [&] {
-    if (!IsRecord(record)) {
-      LogError("gateway refused: no type, interface name or priority of the network's");
+    const Family *family = FamilyOf(record);
+    if (family == nullptr) {
+      LogError("gateway refused: unknown type");
       return false;
     }
     const vornhost::UniqueFd turn = vornhost::TakeRouteTurn();
     Netlink netlink;
-    const std::string name = record["ifname"].asString();
-    if (!Gateways(netlink, FamilyOf(record)->number).Place(name, record["priority"].asUInt())) {
-      LogError("gateway %s refused: named twice, or its place %u is behind the end", LogText(name).c_str(),
-               record["priority"].asUInt());
-      return false;
+    Gateways gateways(netlink, family->number);
+    const auto fault = Store(gateways, record);
+    if (fault) {
+      const std::string name = record["ifname"].isString() ? record["ifname"].asString() : "";
+      LogError("gateway \"%s\" refused: %s", LogText(name).c_str(), LogText(*fault).c_str());
+      gateways.Refresh();
     }
-    return true;
+    return !fault;
   });
 }
 
@@ -108,6 +136,7 @@ int NetClient::RefreshGateway(const Json::Value &request) {
   return vornhost::AnswerFor("default gateway cannot be refreshed", [&] {
     const Family *family = FamilyOf(request);
     if (family == nullptr) {
+      LogError("default gateway not refreshed: unknown type");
       return false;
     }
     const vornhost::UniqueFd turn = vornhost::TakeRouteTurn();

@@ -14,6 +14,8 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
+#include <functional>
+#include <optional>
 #include <stdexcept>
 #include <thread>
 
@@ -24,10 +26,47 @@ namespace {
 // How long a link that came back must stay before the traffic moves back to it.
 constexpr auto kSettleTime = std::chrono::seconds(5);
 
+// What could not be done may be possible a moment later, and no news may tell of it.
+constexpr auto kRetryTime = std::chrono::seconds(5);
+
 // Changes come in bursts: a link that comes up brings addresses, and they bring routes.
 constexpr auto kBurst = std::chrono::milliseconds(20);
 
+// Links that were lost and are not there any more. One that is plugged in again soon settles all the same.
+constexpr size_t kGoneLimit = 64;
+
+// What settles and how the links stand are of one moment: a link that came back in between would count as settled.
+using FindSettling = std::function<Settling(const std::vector<Link> &links)>;
+
+std::vector<std::string> Restore(const FindSettling &findSettling) {
+  std::vector<std::string> failures;
+  const auto attempt = [&failures](const auto &action) {
+    try {
+      const std::vector<std::string> refused = action();
+      failures.insert(failures.end(), refused.begin(), refused.end());
+    } catch (const std::exception &error) {
+      failures.emplace_back(error.what());
+    }
+  };
+  attempt([&]() -> std::vector<std::string> {
+    const UniqueFd turn = TakeRouteTurn();
+    Netlink netlink;
+    const std::vector<Link> links = netlink.Links();
+    const Settling settling = findSettling(links);
+    for (const int family : {AF_INET, AF_INET6}) {
+      attempt([&] { return StaticRoutes(netlink, family).Install(); });
+      attempt([&] { return Gateways(netlink, family).Follow(links, settling); });
+    }
+    return {};
+  });
+  return failures;
+}
+
 } // namespace
+
+std::vector<std::string> RestoreRoutes() {
+  return Restore([](const std::vector<Link> &) { return std::nullopt; });
+}
 
 void RouteFollower::SocketDeleter::operator()(nl_sock *socket) const {
   nl_socket_free(socket);
@@ -60,9 +99,14 @@ void RouteFollower::NoteLinks(const std::vector<Link> &links) {
     }
   }
   running_ = std::move(running);
+  if (lost_.size() > kGoneLimit) {
+    std::erase_if(lost_, [&links](const std::string &name) {
+      return std::none_of(links.begin(), links.end(), [&name](const Link &link) { return link.name == name; });
+    });
+  }
 }
 
-std::set<std::string> RouteFollower::Settling() {
+std::set<std::string> RouteFollower::NamesSettling() {
   const auto now = Clock::now();
   std::erase_if(settled_, [now](const auto &entry) { return entry.second <= now; });
   std::set<std::string> names;
@@ -72,46 +116,26 @@ std::set<std::string> RouteFollower::Settling() {
   return names;
 }
 
-std::vector<std::string> RouteFollower::Apply() {
-  std::vector<std::string> failures;
-  const auto attempt = [&failures](const auto &action) {
-    try {
-      action();
-    } catch (const std::exception &error) {
-      failures.emplace_back(error.what());
-    }
-  };
-  attempt([&] {
-    const UniqueFd turn = TakeRouteTurn();
-    Netlink netlink;
-    NoteLinks(netlink.Links());
-    const std::set<std::string> settling = Settling();
-    for (const int family : {AF_INET, AF_INET6}) {
-      attempt([&] {
-        const std::vector<std::string> refused = StaticRoutes(netlink, family).Install();
-        failures.insert(failures.end(), refused.begin(), refused.end());
-      });
-      attempt([&] { Gateways(netlink, family).Refresh(settling); });
-    }
-  });
-  return failures;
-}
-
-// What the messages say is asked for anew anyway; one that was lost counts as one that came.
+// What the messages say is asked for anew anyway; one that was lost (ENOBUFS) counts as one that came.
 void RouteFollower::Drain() {
   std::array<char, 16384> buffer{};
   while (recv(nl_socket_get_fd(socket_.get()), buffer.data(), buffer.size(), MSG_DONTWAIT) >= 0 || errno == ENOBUFS ||
          errno == EINTR) {
   }
+  if (errno != EAGAIN) {
+    throw std::runtime_error(std::string("rtnetlink: ") + std::strerror(errno));
+  }
 }
 
-void RouteFollower::Wait() {
-  int timeout = -1;
+void RouteFollower::Wait(bool isWhole) {
+  using std::chrono::milliseconds;
+  const auto now = Clock::now();
+  auto until = isWhole ? Clock::time_point::max() : now + kRetryTime;
   for (const auto &[name, when] : settled_) {
-    const auto left = std::chrono::ceil<std::chrono::milliseconds>(when - Clock::now()).count();
-    const int wait = static_cast<int>(std::max<decltype(left)>(left, 0));
-    timeout = timeout < 0 ? wait : std::min(timeout, wait);
+    until = std::min(until, std::max(when, now));
   }
+  const bool isEndless = until == Clock::time_point::max();
+  const int timeout = isEndless ? -1 : static_cast<int>(std::chrono::ceil<milliseconds>(until - now).count());
   pollfd entry{nl_socket_get_fd(socket_.get()), POLLIN, 0};
   if (poll(&entry, 1, timeout) > 0) {
     std::this_thread::sleep_for(kBurst);
@@ -122,14 +146,17 @@ void RouteFollower::Wait() {
 void RouteFollower::Follow() {
   std::vector<std::string> told;
   for (;;) {
-    const std::vector<std::string> failures = Apply();
+    const std::vector<std::string> failures = Restore([this](const std::vector<Link> &links) {
+      NoteLinks(links);
+      return NamesSettling();
+    });
     if (failures != told) {
       for (const std::string &failure : failures) {
         LogError("routes: %s", LogText(failure).c_str());
       }
       told = failures;
     }
-    Wait();
+    Wait(failures.empty());
   }
 }
 

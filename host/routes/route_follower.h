@@ -19,16 +19,19 @@ struct nl_sock;
 
 namespace vornhost {
 
+/// Makes static routes and default routes of both families follow their files, once. A link that a follower lets settle
+/// goes on settling.
+/// @return what could not be done, a text for each
+std::vector<std::string> RestoreRoutes();
+
 class RouteFollower {
 public:
   /// Listens from now on. Throws std::runtime_error when it cannot.
   RouteFollower();
 
-  /// Makes static routes and default routes of both families follow their files, once.
-  /// @return what could not be done, a text for each
-  std::vector<std::string> Apply();
-
-  /// Applies now and at each change, for ever. What cannot be done is logged once, until something else cannot.
+  /// Restores now, at each change, and some seconds after something could not be done, for ever. What cannot be done is
+  /// logged once, until something else cannot. Throws std::runtime_error when the kernel cannot be listened to any
+  /// more.
   [[noreturn]] void Follow();
 
 private:
@@ -39,8 +42,8 @@ private:
   };
 
   void NoteLinks(const std::vector<Link> &links);
-  std::set<std::string> Settling();
-  void Wait();
+  std::set<std::string> NamesSettling();
+  void Wait(bool isWhole);
   void Drain();
 
   std::unique_ptr<nl_sock, SocketDeleter> socket_;

@@ -1,8 +1,8 @@
 #include "host/routes/rule_store.h"
 
 #include "host/network/names.h"
-#include "host/network/topology_config.h"
 #include "host/packageserver/strict_json.h"
+#include "host/routes/route_rule.h"
 #include "host/utility/atomic_file.h"
 #include "host/utility/line_file.h"
 #include "platform/utility.h"
@@ -12,7 +12,9 @@
 #include <sys/file.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <cstring>
@@ -41,10 +43,23 @@ std::string ReadOrEmpty(const std::string &path) {
   return content;
 }
 
-void Write(const std::string &path, const std::string &content) {
-  if ((mkdir("/etc/iproute2", 0755) != 0 && errno != EEXIST) || (mkdir(kFolder, 0755) != 0 && errno != EEXIST)) {
-    Fail(kFolder, std::strerror(errno));
+// A folder that is made is on the disk before something is put into it.
+void MakeFolder(const std::string &path) {
+  if (mkdir(path.c_str(), 0755) != 0) {
+    if (errno != EEXIST) {
+      Fail(path, std::strerror(errno));
+    }
+    return;
   }
+  const UniqueFd parent(open(path.substr(0, path.rfind('/')).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!parent.IsOpen() || fsync(parent.Get()) != 0) {
+    Fail(path, std::strerror(errno));
+  }
+}
+
+void Write(const std::string &path, const std::string &content) {
+  MakeFolder("/etc/iproute2");
+  MakeFolder(kFolder);
   const auto render = [&content](const std::string &, std::string &fresh) {
     fresh = content;
     return 0;
@@ -57,7 +72,7 @@ void Write(const std::string &path, const std::string &content) {
 } // namespace
 
 UniqueFd TakeRouteTurn() {
-  mkdir(kRunFolder, 0755);
+  mkdir(kRunFolder, 0700); // whoever could open the lock could hold every change up
   const std::string path = std::string(kRunFolder) + "/routes.lock";
   UniqueFd file(open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
   if (!file.IsOpen()) {
@@ -99,8 +114,10 @@ std::vector<std::string> ReadGatewayOrder(int family) {
   std::vector<std::string> names;
   LineReader lines(content);
   for (std::string_view line; lines.Next(line);) {
-    if (IsInterfaceName(std::string(line))) {
-      names.emplace_back(line);
+    const std::string name(line);
+    const bool isRepeated = std::find(names.begin(), names.end(), name) != names.end();
+    if (IsRoutableName(name) && !isRepeated && names.size() < kGatewayLimit) {
+      names.push_back(name);
     }
   }
   return names;

@@ -26,7 +26,11 @@ Json::Value ReadRules(int family);
 /// Stores the rules durably. Throws std::runtime_error when that fails; the file is as it was then.
 void WriteRules(int family, const Json::Value &rules);
 
-/// Throws std::runtime_error when the file cannot be read. A line that is no interface name is passed over.
+/// No order is longer.
+constexpr size_t kGatewayLimit = 64;
+
+/// Throws std::runtime_error when the file cannot be read. What could not have been stored is passed over: a line that
+/// is no name of an interface for routes, one that was there before, and what is behind the longest order.
 std::vector<std::string> ReadGatewayOrder(int family);
 
 /// As WriteRules.

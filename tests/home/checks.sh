@@ -84,8 +84,8 @@ set_topology() { # TARGET: prints the answer
   call Topology 1 set "{\"net_topology\": \"$1\"}" | sed -n 1p
 }
 
-succeeded() { # ANSWER
-  jq -e .success <<<"$1" >/dev/null
+succeeded() { # ANSWER. No answer is no success; jq -e alone takes it for one.
+  [ "$(jq .success <<<"$1")" = true ]
 }
 
 log_lines() { # PATTERN: how many lines of the router's log have it
@@ -118,6 +118,13 @@ kill_server() {
   local program
   program=$(at router pidof vornwebd) && at router sh -c "kill -KILL $program" &&
     eventually 5 not kill -0 "$server_pid" 2>/dev/null
+}
+
+has_second_lease() { [ -n "$(addresses_of router eth1)" ]; }
+
+bring_second_up() { # the router's second way out
+  at router sh -c 'printf "DEVICE=eth1\nBOOTPROTO=dhcp\n" >/etc/sysconfig/network-scripts/ifcfg-eth1
+    /usr/vorn/sbin/vorntopology start' && eventually 5 has_second_lease
 }
 
 home_log_has() { # TEXT

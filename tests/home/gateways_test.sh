@@ -29,11 +29,6 @@ files_and_routes() {
 
 readonly FIRST='203.0.113.*' SECOND='198.51.100.*' FIRST6='2001:db8:1:*' SECOND6='2001:db8:9:*'
 
-has_lease() { [ -n "$(addresses_of router eth1)" ]; }
-bring_second_up() {
-  at router sh -c 'printf "DEVICE=eth1\nBOOTPROTO=dhcp\n" >/etc/sysconfig/network-scripts/ifcfg-eth1
-    /usr/vorn/sbin/vorntopology start' && eventually 5 has_lease
-}
 need "the router brings its second way out up" bring_second_up
 check "the traffic leaves by the first all the same" laptop_leaves_by "$FIRST"
 
@@ -98,7 +93,16 @@ check "a name that is none is" refused 4300 '{"iptype": "ipv4", "ifnames": ["eth
 check "the loopback is" refused 4300 '{"iptype": "ipv4", "ifnames": ["lo"]}'
 check "an unknown family is" refused 4300 '{"iptype": "IPv4", "ifnames": ["eth1"]}'
 check "a missing family is" refused 4302 '{"ifnames": ["eth1"]}'
-repeated() { same 4300 "$(gateways set '{"iptype": "ipv4", "ifnames": ["eth0", "eth0"]}' | jq .error.code)"; }
-check "a name given twice is" repeated
+check "a name given twice is" refused 4302 '{"iptype": "ipv4", "ifnames": ["eth1", "eth1"]}'
 check "and the traffic leaves as before" laptop_leaves_by "$FIRST"
+
+# A later name that the platform refuses ends the order there. What was taken before it stands, and all say the same.
+need "the order eth1 is taken" set_order ipv4 '["eth1"]'
+half=$(files_and_routes)
+need "the order eth0, eth1 is taken" set_order ipv4 '["eth0", "eth1"]'
+need "files and routes are as before" same "$before" "$(files_and_routes)"
+check "a later name that is none is refused" same 4300 \
+  "$(gateways set '{"iptype": "ipv4", "ifnames": ["eth1", "eth0;id"]}' | jq .error.code)"
+check "files and kernel agree on what was taken before it" same "$half" "$(files_and_routes)"
+check "and the traffic leaves so" laptop_leaves_by "$SECOND"
 finish

@@ -1,4 +1,5 @@
 // The gateway records and the default routes by their order, over the kernel of a private network.
+#include "host/routes/route_follower.h"
 #include "platform/netclient.h"
 #include "tests/host/files.h"
 #include "tests/host/network/shell.h"
@@ -6,6 +7,9 @@
 #include "tests/host/utility/syslog_record.h"
 
 #include <gmock/gmock.h>
+
+#include <algorithm>
+#include <thread>
 
 using namespace hosttest; // NOLINT(google-build-using-namespace)
 using testing::ElementsAre;
@@ -92,16 +96,106 @@ TEST_F(GatewayTest, Add_WhatIsNoRecordIsRefusedAndChangesNothing) {
   EXPECT_EQ(ReadText(kOrder4), "wan0\n");
 }
 
-TEST_F(GatewayTest, Add_ANameGivenTwiceOrAGapIsRefused) {
+TEST_F(GatewayTest, Add_ANamePlacedAgainMovesAndAGapIsRefused) {
   NetClient client;
   ASSERT_GE(client.AddGatewayData(Record("wan1", 0U)), 0);
   ASSERT_GE(client.AddGatewayData(Record("wan0", 1U)), 0);
   TakeLogLines();
-  EXPECT_LT(client.AddGatewayData(Record("wan1", 1U)), 0);
-  EXPECT_THAT(TakeLogLines(), ElementsAre("3 gateway wan1 refused: named twice, or its place 1 is behind the end"));
+  EXPECT_GE(client.AddGatewayData(Record("wan1", 1U)), 0);
+  EXPECT_EQ(ReadText(kOrder4), "wan0\nwan1\n");
+  EXPECT_LT(client.AddGatewayData(Record("wan1", 2U)), 0);
   EXPECT_LT(client.AddGatewayData(Record("usb0", 3U)), 0);
-  EXPECT_LT(client.AddGatewayData(Record("usb0", 4294967295U)), 0);
+  EXPECT_THAT(TakeLogLines(), ElementsAre("3 gateway \"wan1\" refused: its place 2 is behind the end",
+                                          "3 gateway \"usb0\" refused: its place 3 is behind the end"));
+  EXPECT_EQ(ReadText(kOrder4), "wan0\nwan1\n");
+}
+
+TEST_F(GatewayTest, Add_ALongOrderLosesItsTail) {
+  NetClient client;
+  for (Json::UInt i = 0; i < 64; ++i) {
+    ASSERT_GE(client.AddGatewayData(Record("usb" + std::to_string(i), i)), 0);
+  }
+  EXPECT_GE(client.AddGatewayData(Record("wan0", 0U)), 0);
+  const std::string order = ReadText(kOrder4);
+  EXPECT_EQ(order.substr(0, 10), "wan0\nusb0\n");
+  EXPECT_EQ(order.substr(order.size() - 6), "usb62\n");
+  EXPECT_EQ(std::count(order.begin(), order.end(), '\n'), 64);
+  EXPECT_THAT(TakeLogLines(), IsEmpty());
+  for (const Json::UInt place : {64U, 4294967295U}) {
+    EXPECT_LT(client.AddGatewayData(Record("usb0", place)), 0);
+    EXPECT_THAT(TakeLogLines(), ElementsAre("3 gateway \"usb0\" refused: no order is longer than 64"));
+  }
+  EXPECT_EQ(ReadText(kOrder4), order);
+}
+
+TEST_F(GatewayTest, Add_EveryRefusalSaysWhy) {
+  NetClient client;
+  Json::Value other = Record("wan1", 0U);
+  other["dns"] = "10.8.0.1";
+  EXPECT_LT(client.AddGatewayData(Record("eth0;id", 0U)), 0);
+  EXPECT_LT(client.AddGatewayData(Record("wan1", -1)), 0);
+  EXPECT_LT(client.AddGatewayData(other), 0);
+  EXPECT_LT(client.AddGatewayData(Record("wan1", 0U, "GTYPE_V5")), 0);
+  EXPECT_LT(client.RefreshGateway(TypeOf("GTYPE_V5")), 0);
+  Json::Value list;
+  EXPECT_LT(client.GetGatewayListData(TypeOf("GTYPE_V5"), list), 0);
+  EXPECT_THAT(TakeLogLines(),
+              ElementsAre("3 gateway \"eth0;id\" refused: no interface name",
+                          "3 gateway \"wan1\" refused: its priority is no place",
+                          "3 gateway \"wan1\" refused: gateway and name server come from the interface's own "
+                          "configuration",
+                          "3 gateway refused: unknown type", "3 default gateway not refreshed: unknown type",
+                          "3 gateways not listed: unknown type"));
+}
+
+TEST_F(GatewayTest, Add_ARefusedRecordLeavesKernelAndFileInAgreement) {
+  Shell("ip route add default via 10.9.0.1 dev wan0 && ip route add default via 10.8.0.1 dev wan1 metric 50");
+  Order({"wan0", "wan1"});
+  NetClient client;
+  ASSERT_GE(client.AddGatewayData(Record("wan1", 0U)), 0);
+  EXPECT_LT(client.AddGatewayData(Record("eth0;id", 1U)), 0);
   EXPECT_EQ(ReadText(kOrder4), "wan1\nwan0\n");
+  EXPECT_EQ(Defaults(), "default via 10.8.0.1 dev wan1 metric 100\ndefault via 10.9.0.1 dev wan0 metric 101\n");
+}
+
+TEST_F(GatewayTest, Add_AnOrderThatCannotBeWrittenLeavesKernelAndFileInAgreement) {
+  Shell("ip route add default via 10.9.0.1 dev wan0 && ip route add default via 10.8.0.1 dev wan1 metric 50");
+  Order({"wan0", "wan1"});
+  ASSERT_GE(NetClient().AddGatewayData(Record("wan1", 0U)), 0);
+  Shell(std::string("mv ") + kOrder4 + " /etc/elsewhere && ln -s /etc/elsewhere " + kOrder4);
+  EXPECT_LT(NetClient().AddGatewayData(Record("usb0", 1U)), 0);
+  EXPECT_EQ(ReadText(kOrder4), "wan1\nwan0\n");
+  EXPECT_EQ(Defaults(), "default via 10.8.0.1 dev wan1 metric 100\ndefault via 10.9.0.1 dev wan0 metric 101\n");
+}
+
+TEST_F(GatewayTest, Add_TwoWhoStoreAnOrderAtOnceAreBothTaken) {
+  const auto store = [](const std::vector<std::string> &names) {
+    for (int round = 0; round < 50; ++round) {
+      Order(names);
+    }
+  };
+  std::thread one(store, std::vector<std::string>{"wan0", "wan1", "usb0"});
+  std::thread other(store, std::vector<std::string>{"usb0", "wan1", "wan0"});
+  one.join();
+  other.join();
+  EXPECT_THAT(TakeLogLines(), IsEmpty());
+  std::string order = ReadText(kOrder4);
+  EXPECT_THAT((std::vector<std::string>{order.substr(0, 5), order.substr(5, 5), order.substr(10)}),
+              testing::UnorderedElementsAre("wan0\n", "wan1\n", "usb0\n"));
+}
+
+TEST_F(GatewayTest, List_WhatCouldNotHaveBeenStoredIsNoPartOfTheOrder) {
+  Shell("mkdir -p /etc/iproute2/config");
+  std::string content = "lo\n-x\n\nwan0\na b\nwan0\n";
+  for (int i = 0; i < 80; ++i) {
+    content += "usb" + std::to_string(i) + "\n";
+  }
+  WriteText(kOrder4, content);
+  Json::Value list;
+  ASSERT_GE(NetClient().GetGatewayListData(TypeOf("GTYPE_V4"), list), 0);
+  ASSERT_EQ(list.size(), 64U);
+  EXPECT_EQ(list[0]["ifname"], "wan0");
+  EXPECT_EQ(list[1]["ifname"], "usb0");
 }
 
 TEST_F(GatewayTest, Refresh_TrafficLeavesByTheFirstOfTheOrder) {
@@ -147,6 +241,23 @@ TEST_F(GatewayTest, Refresh_ALostLinkGoesBehindAllOthers) {
   EXPECT_EQ(Defaults(), "default via 10.8.0.1 dev wan1 metric 101\n"
                         "default via 10.9.0.1 dev wan0 metric 30000 linkdown\n");
   EXPECT_EQ(WayOut(), "wan1\n");
+}
+
+TEST_F(GatewayTest, Refresh_MovesNoTrafficBackToALinkThatSettles) {
+  for (const char *metric : {"500", "30000"}) { // settling; or the follower did not see yet that the link is back
+    Shell(std::string("ip route replace default via 10.9.0.1 dev wan0 metric ") + metric +
+          " && ip route replace default via 10.8.0.1 dev wan1 metric 101");
+    Order({"wan0", "wan1"});
+    EXPECT_THAT(vornhost::RestoreRoutes(), IsEmpty());
+    EXPECT_EQ(Defaults(), "default via 10.8.0.1 dev wan1 metric 101\ndefault via 10.9.0.1 dev wan0 metric 500\n");
+  }
+}
+
+TEST_F(GatewayTest, Refresh_ADefaultRouteOverSeveralHopsIsLeftAlone) {
+  Shell("ip route add default metric 7 nexthop via 10.9.0.1 dev wan0 nexthop via 10.8.0.1 dev wan1");
+  const std::string before = Defaults();
+  Order({"wan1", "wan0"});
+  EXPECT_EQ(Defaults(), before);
 }
 
 TEST_F(GatewayTest, Refresh_AnAdvertisedRouteStaysAndGetsACopyBeforeIt) {
@@ -204,6 +315,30 @@ TEST_F(GatewayTest, List_TellsOfEachInterfaceHowItStands) {
   EXPECT_EQ(list[1]["state"], "no-link");
   ASSERT_GE(NetClient().GetGatewayListData(TypeOf("GTYPE_V6"), list), 0);
   EXPECT_EQ(Text(list), "[]");
+}
+
+TEST_F(GatewayTest, List_ARouteOverALostLinkIsNotActive) {
+  Shell("ip route add default via 10.9.0.1 dev wan0 && ip route add default via 10.8.0.1 dev wan1 metric 50 && "
+        "ip link set wan0p down");
+  ASSERT_TRUE(Eventually(2000, [] { return Shell("cat /sys/class/net/wan0/carrier") == "0\n"; }));
+  Json::Value list;
+  const auto isActive = [&list](const std::string &name) {
+    return std::any_of(list.begin(), list.end(), [&name](const Json::Value &record) {
+      return record["ifname"] == name && record["active"] == Json::Value(true);
+    });
+  };
+  ASSERT_TRUE(Eventually(
+      2000, [&] { return NetClient().GetGatewayListData(TypeOf("GTYPE_V4"), list) >= 0 && isActive("wan1"); }));
+  EXPECT_FALSE(isActive("wan0"));
+}
+
+TEST_F(GatewayTest, List_ADefaultRouteWithoutAGatewayIsReady) {
+  Shell("ip route add default dev wan0");
+  Json::Value list;
+  ASSERT_GE(NetClient().GetGatewayListData(TypeOf("GTYPE_V4"), list), 0);
+  ASSERT_EQ(list.size(), 1U);
+  EXPECT_EQ(list[0]["state"], "ready");
+  EXPECT_EQ(list[0]["gateway"], "");
 }
 
 TEST_F(GatewayTest, List_NullAsksForBothFamiliesAndAnUnknownTypeForNone) {

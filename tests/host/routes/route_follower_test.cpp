@@ -104,6 +104,72 @@ TEST_F(RouteFollowerTest, ASettlingLinkIsBetterThanNone) {
   EXPECT_TRUE(Eventually(1000, [] { return LeavesBy("wan1"); }));
 }
 
+TEST_F(RouteFollowerTest, ARefreshOfSomebodyElseMovesNothingBackToASettlingLink) {
+  Shell("ip route add default via 10.9.0.1 dev wan0 && ip route add default via 10.8.0.1 dev wan1 metric 9");
+  StoreOrder("wan0\nwan1\n");
+  Follow();
+  ASSERT_TRUE(Eventually(2000, [] { return LeavesBy("wan0"); }));
+  Shell("ip link set wan0p down");
+  ASSERT_TRUE(Eventually(2000, [] { return LeavesBy("wan1"); }));
+  const auto back = steady_clock::now();
+  Shell("ip link set wan0p up");
+  Json::Value request;
+  request["type"] = "GTYPE_V4";
+  while (steady_clock::now() - back < std::chrono::seconds(3)) {
+    ASSERT_GE(vornnetwork::dbus::NetClient().RefreshGateway(request), 0);
+    vornhost::RestoreRoutes();
+    ASSERT_TRUE(LeavesBy("wan1"));
+    Sleep(50);
+  }
+  EXPECT_TRUE(Eventually(10000, [] { return LeavesBy("wan0"); }));
+}
+
+TEST_F(RouteFollowerTest, AnInterfaceThatTheKernelRefusesCostsNoOther) {
+  Shell("ip route add default via 10.9.0.1 dev wan0");
+  Shell("ip addr flush dev wan1 && ip route add default via 10.8.0.1 dev wan1 metric 5000 onlink && "
+        "ip addr add 10.8.0.1/32 dev wan1"); // a gateway that is the router itself now
+  StoreOrder("wan1\nwan0\n");
+  Follow();
+  EXPECT_TRUE(Eventually(2000, [] {
+    return Shell("ip route show default | sed 's/ *$//'") ==
+           "default via 10.9.0.1 dev wan0 metric 101\ndefault via 10.8.0.1 dev wan1 metric 5000 onlink\n";
+  })) << Shell("ip route show default");
+  Shell("ip addr add 10.8.0.2/24 dev wan1 && ip addr del 10.8.0.1/32 dev wan1"); // now it is not
+  EXPECT_TRUE(Eventually(2000, [] { return LeavesBy("wan1"); }));
+}
+
+TEST_F(RouteFollowerTest, AGatewayOutsideItsLeasesSubnetIsReachedOnTheLink) {
+  Shell("ip addr flush dev wan0 && ip addr add 10.9.0.2/32 dev wan0 && mkdir -p /run/vorn");
+  WriteText("/run/vorn/lease.wan0", "ip=10.9.0.2\nrouter=10.66.0.1\n");
+  StoreOrder("wan0\n");
+  Follow();
+  EXPECT_TRUE(Eventually(2000, [] {
+    return Shell("ip route show default | sed 's/ *$//'") ==
+           "default via 10.66.0.1 dev wan0 proto dhcp metric 100 onlink\n";
+  })) << Shell("ip route show default");
+}
+
+TEST_F(RouteFollowerTest, WhatCouldNotBeDoneIsTriedAgainWithoutNews) {
+  ASSERT_EQ(SetRules(ManyRules(1, "192.168.7.2")), 0);
+  const std::string file = ReadText("/etc/iproute2/config/static-route");
+  const std::string before = OwnRoutes();
+  WriteText("/etc/iproute2/config/static-route", "no rules");
+  Shell("ip route flush proto 86");
+  Follow();
+  Sleep(300);
+  EXPECT_EQ(OwnRoutes(), "");
+  WriteText("/etc/iproute2/config/static-route", file); // which no netlink message tells of
+  EXPECT_TRUE(Eventually(8000, [&] { return OwnRoutes() == before; }));
+}
+
+TEST_F(RouteFollowerTest, ASocketThatIsNoneAnyMoreEndsIt) {
+  const int before = dup(STDIN_FILENO); // the lowest number that is free is the socket's
+  close(before);
+  vornhost::RouteFollower follower;
+  ASSERT_EQ(dup2(STDIN_FILENO, before), before);
+  EXPECT_THROW(follower.Follow(), std::runtime_error);
+}
+
 TEST_F(RouteFollowerTest, AnInterfaceSetDownAndUpGetsTheRouteOfItsLeaseAgain) {
   Shell("ip route add default via 10.9.0.1 dev wan0 proto dhcp && mkdir -p /run/vorn");
   WriteText("/run/vorn/lease.wan0", "ip=10.9.0.2\nrouter=10.9.0.1\n");

@@ -18,6 +18,7 @@ using namespace hosttest; // NOLINT(google-build-using-namespace)
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
+using vornhost::RestoreRoutes;
 using vornnetwork::network::IP_TYPE_V4;
 using vornnetwork::network::IP_TYPE_V6;
 using vornnetwork::network::StaticRoute;
@@ -43,10 +44,6 @@ double Spent() { // microseconds of processor time, here and in the kernel: what
 
 double Now() { // milliseconds
   return std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now().time_since_epoch()).count();
-}
-
-std::vector<std::string> Restore() {
-  return vornhost::RouteFollower().Apply();
 }
 
 TEST_F(StaticRouteTest, Set_InstallsBothFamiliesUnderAProtocolOfTheirOwnAndStoresThem) {
@@ -279,10 +276,10 @@ TEST_F(StaticRouteTest, Restore_MakesTheKernelFollowTheFileEachRuleForItself) {
   Shell("ip route flush proto 86 && ip -6 route flush proto 86");
   Shell("ip route add 10.99.0.0/16 via 192.168.7.2 proto 86");            // left by one that was killed
   Shell("ip route add 10.128.1.0/24 via 192.168.7.77 dev lan0 proto 86"); // the same
-  EXPECT_THAT(Restore(), IsEmpty());
+  EXPECT_THAT(RestoreRoutes(), IsEmpty());
   EXPECT_EQ(AllRoutes(), before);
   Shell("ip route flush proto 86 && ip route add 10.128.1.0/24 via 192.168.7.9 proto static");
-  EXPECT_THAT(Restore(), ElementsAre("add route 10.128.1.0/24: File exists"));
+  EXPECT_THAT(RestoreRoutes(), ElementsAre("add route 10.128.1.0/24: File exists"));
   EXPECT_EQ(OwnRoutes(), "10.128.0.0/24 via 192.168.7.2 dev lan0\n10.128.2.0/24 via 192.168.7.2 dev lan0\n");
 }
 
@@ -290,7 +287,7 @@ TEST_F(StaticRouteTest, Restore_OneBadRuleInTheFileCostsNoOther) {
   Shell("mkdir -p /etc/iproute2/config");
   WriteText(kFile4, "[5," + Text(Rule4("10.20.0.1", "255.255.0.0", "192.168.7.2")) + "," +
                         Text(Rule4("10.21.0.0", "255.255.0.0", "192.168.7.2")) + "]");
-  EXPECT_THAT(Restore(), IsEmpty());
+  EXPECT_THAT(RestoreRoutes(), IsEmpty());
   EXPECT_EQ(OwnRoutes(), "10.21.0.0/16 via 192.168.7.2 dev lan0\n");
 }
 
@@ -362,7 +359,7 @@ TEST_F(StaticRouteTest, Set_WritersTakeTurnsAndTheLastOneStands) {
       thread.join();
     }
   }
-  EXPECT_EQ(Restore(), std::vector<std::string>());
+  EXPECT_EQ(RestoreRoutes(), std::vector<std::string>());
   const Json::Value rules = GetRules();
   ASSERT_EQ(rules.size(), 50U);
   for (const Json::Value &rule : rules) {
@@ -390,7 +387,7 @@ TEST_F(StaticRouteTest, Set_KilledAtAnyPointFileAndKernelAgreeAfterTheNextStart)
     writer.Kill();
     const bool isOne = GetRules().size() == 40;
     disagreed += OwnRoutes() == (isOne ? routesOfOne : routesOfOther) ? 0 : 1;
-    EXPECT_THAT(Restore(), IsEmpty());
+    EXPECT_THAT(RestoreRoutes(), IsEmpty());
     EXPECT_EQ(OwnRoutes(), isOne ? routesOfOne : routesOfOther);
   }
   std::printf("killed between kernel and file: %d of 60\n", disagreed);
