@@ -21,7 +21,7 @@ std::vector<IpNetwork> ReservedOf(int family) {
     return IpNetwork::Parse(text, family)->WithLength(length);
   };
   if (family == AF_INET) {
-    return {make("0.0.0.0", 8), make("127.0.0.0", 8), make("224.0.0.0", 3)};
+    return {make("0.0.0.0", 8), make("127.0.0.0", 8), make("169.254.0.0", 16), make("224.0.0.0", 3)};
   }
   return {make("::", 96), make("::ffff:0:0", 96), make("fe80::", 10), make("ff00::", 8)};
 }
@@ -136,11 +136,10 @@ Surroundings::Surroundings(Netlink &netlink) {
     links_.emplace(link.name, std::move(link));
   }
   for (const Address &address : netlink.Addresses()) {
-    const auto network = IpNetwork::Parse(address.Host(), address.family);
-    const size_t slash = address.text.find('/');
-    if (network) {
-      const int length = slash == std::string::npos ? network->GetBits() : std::stoi(address.text.substr(slash + 1));
-      addresses_.emplace_back(address.index, network->WithLength(length));
+    const auto own = IpNetwork::ParseSubnet(address.text, address.family);
+    const auto subnet = address.peer.empty() ? own : IpNetwork::ParseSubnet(address.peer, address.family);
+    if (own && subnet) {
+      neighbourhoods_.push_back({address.index, *own, *subnet});
     }
   }
 }
@@ -168,11 +167,14 @@ std::optional<RuleFault> Surroundings::GatewayFault(const RouteRule &rule, const
   static const IpNetwork kLinkLocal6 = IpNetwork::Parse("fe80::", AF_INET6)->WithLength(10);
   const IpNetwork gateway = *IpNetwork::Parse(rule.gateway, rule.family);
   bool onLink = kLinkLocal6.Contains(gateway);
-  for (const auto &[index, address] : addresses_) {
-    if (address.IsSameAddress(gateway)) {
+  for (const auto &[index, own, subnet] : neighbourhoods_) {
+    if (own.IsSameAddress(gateway)) {
       return RuleFault{"gateway", "an address of this router"};
     }
-    onLink = onLink || (index == link.index && address.Contains(gateway));
+    if (index == link.index && subnet.IsEdge(gateway)) {
+      return RuleFault{"gateway", "the subnet's own address or its broadcast address"};
+    }
+    onLink = onLink || (index == link.index && subnet.Contains(gateway));
   }
   if (!onLink) {
     return RuleFault{"gateway", "not on the interface's link"};

@@ -14,7 +14,6 @@
 #include <optional>
 #include <string>
 #include <unordered_map>
-#include <utility>
 #include <vector>
 
 namespace vornhost {
@@ -71,7 +70,12 @@ private:
   std::optional<RuleFault> GatewayFault(const RouteRule &rule, const Link &link) const;
 
   std::unordered_map<std::string, Link> links_;
-  std::vector<std::pair<int, IpNetwork>> addresses_; // with the index of the link
+  struct Neighbourhood {
+    int index = 0; // of the link
+    IpNetwork own;
+    IpNetwork subnet; // what is on the link: the address's own subnet, or the other end of a point-to-point link
+  };
+  std::vector<Neighbourhood> neighbourhoods_;
 };
 
 /// The kernel's route of a rule. REQUIRES: the rule's interface is `link`.

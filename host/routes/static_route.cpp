@@ -34,6 +34,7 @@ StaticRoute::~StaticRoute() = default;
 
 int StaticRoute::GetRules(IP_TYPE type, Json::Value &list) {
   return vornhost::AnswerFor("static routes cannot be read", [&] {
+    const vornhost::UniqueFd turn = vornhost::TakeRouteTurn(); // the file and the kernel of one moment
     Netlink netlink;
     list = StaticRoutes(netlink, FamilyOf(type)).List();
     return true;

@@ -5,6 +5,7 @@
 #include "host/utility/log.h"
 
 #include <linux/rtnetlink.h>
+#include <sys/socket.h>
 
 #include <algorithm>
 #include <map>
@@ -19,6 +20,23 @@ using RouteKey = std::tuple<std::string, std::string, int, uint32_t>;
 
 RouteKey KeyOf(const Route &route) {
   return {route.destination, route.gateway, route.index, route.metric};
+}
+
+// Those that are ours, or may be: the kernel shows all hops of an IPv6 route under the first one's protocol, and yet
+// deletes a hop for the protocol only that it was added with.
+std::vector<Route> OwnOf(const std::vector<Route> &all) {
+  std::vector<Route> own;
+  for (const Route &route : all) {
+    if (route.protocol == kStaticRouteProtocol || (route.family == AF_INET6 && route.isOneOfMany)) {
+      own.push_back(route);
+      own.back().protocol = kStaticRouteProtocol;
+    }
+  }
+  return own;
+}
+
+bool SharePlace(const Route &one, const Route &other) {
+  return one.destination == other.destination && one.metric == other.metric;
 }
 
 void LogFault(Json::ArrayIndex at, const RuleFault &fault) {
@@ -49,17 +67,11 @@ const RuleFault kDuplicate = {"ip", "duplicate of another rule's network"};
 
 } // namespace
 
-std::vector<Route> StaticRoutes::Present() {
-  std::vector<Route> routes = netlink_.RoutesOf(family_, RT_TABLE_MAIN);
-  std::erase_if(routes, [](const Route &route) { return route.protocol != kStaticRouteProtocol; });
-  return routes;
-}
-
 Json::Value StaticRoutes::List() {
   Json::Value rules = ReadRules(family_);
   const Surroundings surroundings(netlink_);
   std::set<RouteKey> present;
-  for (const Route &route : Present()) {
+  for (const Route &route : OwnOf(netlink_.RoutesOf(family_, RT_TABLE_MAIN))) {
     present.insert(KeyOf(route));
   }
   for (Json::Value &object : rules) {
@@ -92,7 +104,9 @@ bool StaticRoutes::Accept(const Json::Value &rules, const Json::Value &stored, c
   }
   std::map<std::string, RouteRule> known;
   for (const RouteRule &rule : GoodRules(stored, family_)) {
-    known.insert_or_assign(rule.destination, rule);
+    if (rule.enabled) {
+      known.insert_or_assign(rule.destination, rule);
+    }
   }
   std::set<std::string> taken;
   fresh = Json::Value(Json::arrayValue);
@@ -130,78 +144,84 @@ std::vector<Route> StaticRoutes::Wanted(const Json::Value &rules, const Surround
   return wanted;
 }
 
-// What is new or other comes before what goes, so that no network is without a route in between.
+// A replacement takes the first IPv4 route of its place, whosoever, and all hops of the IPv6 one.
+bool StaticRoutes::IsReplaceable(const std::vector<Route> &all, const Route &old) const {
+  const auto isThere = [&old](const Route &route) { return SharePlace(route, old); };
+  const auto first = std::find_if(all.begin(), all.end(), isThere);
+  return KeyOf(*first) == KeyOf(old) && (family_ == AF_INET || std::none_of(first + 1, all.end(), isThere));
+}
+
+// What is new or other comes before what goes, so that no network is without a route in between. Others may have put a
+// route of theirs beside one of ours: each of ours counts for itself.
 std::vector<StaticRoutes::Step> StaticRoutes::Difference(const std::vector<Route> &wanted) {
-  std::map<std::string, Route> present;
-  for (const Route &route : Present()) {
-    present.insert_or_assign(route.destination, route);
+  const std::vector<Route> all = netlink_.RoutesOf(family_, RT_TABLE_MAIN);
+  std::multimap<std::string, Route> left;
+  for (const Route &route : OwnOf(all)) {
+    left.emplace(route.destination, route);
   }
   std::vector<Step> steps;
   for (const Route &route : wanted) {
-    const auto found = present.find(route.destination);
-    if (found == present.end()) {
+    const auto [begin, end] = left.equal_range(route.destination);
+    const auto same = std::find_if(begin, end, [&](const auto &own) { return KeyOf(own.second) == KeyOf(route); });
+    if (same != end) {
+      left.erase(same);
+      continue;
+    }
+    const auto old = std::find_if(begin, end, [&](const auto &own) { return SharePlace(own.second, route); });
+    if (old == end) {
       steps.push_back({std::nullopt, route});
       continue;
     }
-    if (KeyOf(found->second) != KeyOf(route)) {
-      steps.push_back({found->second, route});
-    }
-    present.erase(found);
+    steps.push_back({old->second, route, IsReplaceable(all, old->second)});
+    left.erase(old);
   }
-  for (const auto &[destination, route] : present) {
+  for (const auto &[destination, route] : left) {
     steps.push_back({route, std::nullopt});
   }
   return steps;
 }
 
 void StaticRoutes::Do(const Step &step) {
-  if (!step.fresh) {
-    netlink_.DeleteRoute(*step.old);
-  } else if (step.old) {
+  if (step.isInPlace) {
     netlink_.ReplaceRoute(*step.fresh);
-  } else {
+  } else if (!step.old) {
     netlink_.InsertRoute(*step.fresh);
+  } else {
+    if (step.fresh) {
+      netlink_.AppendRoute(*step.fresh);
+    }
+    netlink_.DeleteRoute(*step.old);
   }
 }
 
 void StaticRoutes::Undo(const Step &step) {
-  if (!step.old) {
-    netlink_.DeleteRoute(*step.fresh);
-  } else if (step.fresh) {
+  if (step.isInPlace) {
     netlink_.ReplaceRoute(*step.old);
-  } else {
-    netlink_.AddRoute(*step.old);
+    return;
+  }
+  if (step.old) {
+    netlink_.AppendRoute(*step.old);
+  }
+  if (step.fresh) {
+    netlink_.DeleteRoute(*step.fresh);
   }
 }
 
-bool StaticRoutes::Change(const std::vector<Route> &wanted) {
-  const std::vector<Step> steps = Difference(wanted);
+bool StaticRoutes::Replace(const Json::Value &rules) {
+  const Surroundings surroundings(netlink_);
+  Json::Value fresh;
+  if (!Accept(rules, ReadRules(family_), surroundings, fresh)) {
+    return false;
+  }
+  const std::vector<Step> steps = Difference(Wanted(fresh, surroundings));
   StepSequence sequence;
   for (const Step &step : steps) {
     sequence.Add(
         "route to " + step.Destination(), [this, &step] { Do(step); }, [this, &step] { Undo(step); });
   }
+  sequence.Add(
+      "file of the rules", [&] { WriteRules(family_, fresh); }, [] { /* whole or not at all */ });
   return sequence.Run() == StepSequence::Outcome::kDone;
-}
-
-bool StaticRoutes::Replace(const Json::Value &rules) {
-  const Json::Value stored = ReadRules(family_);
-  const Surroundings surroundings(netlink_);
-  Json::Value fresh;
-  if (!Accept(rules, stored, surroundings, fresh)) {
-    return false;
-  }
-  const std::vector<Route> before = Wanted(stored, surroundings);
-  if (!Change(Wanted(fresh, surroundings))) {
-    return false;
-  }
-  try {
-    WriteRules(family_, fresh);
-  } catch (const std::exception &) {
-    Change(before);
-    throw;
-  }
-  return true;
 }
 
 std::optional<RuleFault> StaticRoutes::FaultOf(const RuleTexts &texts) {
@@ -209,9 +229,12 @@ std::optional<RuleFault> StaticRoutes::FaultOf(const RuleTexts &texts) {
   if (auto fault = ParseRule(texts, family_, rule)) {
     return fault;
   }
+  if (!rule.enabled) {
+    return std::nullopt;
+  }
   for (const RouteRule &other : GoodRules(ReadRules(family_), family_)) {
-    if (other.enabled && rule.enabled && other.destination == rule.destination) {
-      return kDuplicate;
+    if (other.enabled && other.destination == rule.destination) {
+      return other == rule ? std::nullopt : std::optional(kDuplicate);
     }
   }
   return Surroundings(netlink_).FaultOf(rule);

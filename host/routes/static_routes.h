@@ -29,7 +29,7 @@ public:
   /// changed
   bool Replace(const Json::Value &rules);
 
-  /// Looks whether the rule could be added to the stored ones.
+  /// Looks whether a list of the stored rules and this one would be taken. One that is stored already may be.
   std::optional<RuleFault> FaultOf(const RuleTexts &texts);
 
   /// Makes the kernel's routes follow the file: those rules that can be in the kernel now, each for itself.
@@ -37,21 +37,21 @@ public:
   std::vector<std::string> Install();
 
 private:
-  // From one route to another, of the same destination.
+  // From one route to another, of the same destination with the same metric.
   struct Step {
     std::optional<Route> old;   // nothing: there was none
     std::optional<Route> fresh; // nothing: there will be none
+    bool isInPlace = false;     // the kernel's replacement of the old one touches nobody else's
     const std::string &Destination() const { return (fresh ? fresh : old)->destination; }
   };
 
-  std::vector<Route> Present();
+  bool IsReplaceable(const std::vector<Route> &all, const Route &old) const;
   bool Accept(const Json::Value &rules, const Json::Value &stored, const Surroundings &surroundings,
               Json::Value &fresh) const;
   std::vector<Route> Wanted(const Json::Value &rules, const Surroundings &surroundings) const;
   std::vector<Step> Difference(const std::vector<Route> &wanted);
   void Do(const Step &step);
   void Undo(const Step &step);
-  bool Change(const std::vector<Route> &wanted);
 
   Netlink &netlink_;
   int family_;

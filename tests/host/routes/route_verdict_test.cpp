@@ -80,4 +80,24 @@ TEST_F(RouteVerdictTest, ADuplicateIsOneOfAnEnabledRuleAlone) {
   EXPECT_EQ(Verdict(Make(IP_TYPE_V4, "10.21.0.0", "255.255.0.0", "192.168.7.3", "lan0")), R"({"valid":true})");
 }
 
+TEST_F(RouteVerdictTest, ARuleThatIsOffMayWaitForItsInterface) {
+  EXPECT_EQ(Verdict(Make(IP_TYPE_V4, "10.20.0.0", "255.255.0.0", "10.66.0.1", "nosuch0", false)), R"({"valid":true})");
+  EXPECT_EQ(Verdict(Make(IP_TYPE_V4, "10.20.0.1", "255.255.0.0", "", "nosuch0", false)),
+            Bad("ip", "host bits are set"));
+}
+
+TEST_F(RouteVerdictTest, ARuleThatIsStoredAlreadyIsNoDuplicateOfItself) {
+  ASSERT_EQ(SetRules(List(Rule4("10.20.0.0", "255.255.0.0", "192.168.7.2"))), 0);
+  EXPECT_EQ(Verdict(Make(IP_TYPE_V4, "10.20.0.0", "255.255.0.0", "192.168.7.2", "lan0")), R"({"valid":true})");
+  Shell("ip link set lan0 down"); // it waits, and so it may
+  EXPECT_EQ(Verdict(Make(IP_TYPE_V4, "10.20.0.0", "255.255.0.0", "192.168.7.2", "lan0")), R"({"valid":true})");
+}
+
+TEST_F(RouteVerdictTest, NoHostHasTheSubnetsOwnAddressOrItsBroadcastAddress) {
+  for (const char *gateway : {"192.168.7.0", "192.168.7.255"}) {
+    EXPECT_EQ(Verdict(Make(IP_TYPE_V4, "10.20.0.0", "255.255.0.0", gateway, "lan0")),
+              Bad("gateway", "the subnet's own address or its broadcast address"));
+  }
+}
+
 } // namespace

@@ -88,13 +88,6 @@ TEST_F(StaticRouteTest, Set_AnEmptyListTakesEveryRouteAway) {
   EXPECT_EQ(ReadText(kFile4), "[]\n");
 }
 
-TEST_F(StaticRouteTest, Set_LeavesTheRoutesOfOthersAlone) {
-  Shell("ip route add 10.77.0.0/16 via 192.168.7.9 proto static");
-  ASSERT_EQ(SetRules(ManyRules(1, "192.168.7.2")), 0);
-  EXPECT_EQ(SetRules(Json::Value(Json::arrayValue)), 0);
-  EXPECT_THAT(Shell("ip route"), HasSubstr("10.77.0.0/16 via 192.168.7.9 dev lan0 proto static"));
-}
-
 TEST_F(StaticRouteTest, Set_EveryUnacceptableListIsRefusedWithAReasonAndChangesNothing) {
   ASSERT_EQ(SetRules(ManyRules(2, "192.168.7.2")), 0);
   const std::string good = Text(Rule4("10.50.0.0", "255.255.0.0", "192.168.7.2"));
@@ -128,6 +121,12 @@ TEST_F(StaticRouteTest, Set_EveryUnacceptableListIsRefusedWithAReasonAndChangesN
        "gateway: not on the interface's link"},
       {R"({"ip":"10.1.0.0","mask":"255.255.0.0","gateway":"192.168.7.1","ifname":"lan0","enable":true})",
        "gateway: an address of this router"},
+      {R"({"ip":"10.1.0.0","mask":"255.255.0.0","gateway":"192.168.7.0","ifname":"lan0","enable":true})",
+       "gateway: the subnet's own address or its broadcast address"},
+      {R"({"ip":"10.1.0.0","mask":"255.255.0.0","gateway":"192.168.7.255","ifname":"lan0","enable":true})",
+       "gateway: the subnet's own address or its broadcast address"},
+      {R"({"ip":"169.254.0.0","mask":"255.255.0.0","gateway":"192.168.7.2","ifname":"lan0"})",
+       "ip: not a network that can be routed to"},
       {R"({"ip":"10.1.0.0","mask":"255.255.0.0","ifname":"nosuch0","enable":true})", "ifname: no such interface"},
       {R"({"ip":"10.50.0.0","mask":"255.255.0.0","gateway":"192.168.7.3","ifname":"lan0","enable":true})",
        "ip: duplicate of another rule's network"},
@@ -226,6 +225,26 @@ TEST_F(StaticRouteTest, Set_FileThatCannotBeWrittenLeavesTheKernelAsItWas) {
   EXPECT_EQ(Everything(), before);
 }
 
+TEST_F(StaticRouteTest, Set_AnInterfaceOfTwoAddressesHasNoBroadcastAddress) {
+  Shell("ip addr add 10.3.0.0/31 dev lan0");
+  EXPECT_EQ(SetRules(List(Rule4("10.20.0.0", "255.255.0.0", "10.3.0.1"))), 0);
+  EXPECT_EQ(OwnRoutes(), "10.20.0.0/16 via 10.3.0.1 dev lan0\n");
+}
+
+TEST_F(StaticRouteTest, Set_TheOtherEndOfAPointToPointLinkIsAGateway) {
+  Shell("ip addr add 10.6.0.1 peer 10.6.0.2 dev wan1 && ip addr add fd00:6::1 peer fd00:6::2 dev wan1 nodad");
+  ASSERT_TRUE(Eventually(2000, [] { return !Shell("ip -6 route show fd00:6::2").empty(); })); // made a moment later
+  EXPECT_EQ(SetRules(List(Rule4("10.20.0.0", "255.255.0.0", "10.6.0.2", "wan1"))), 0);
+  EXPECT_EQ(SetRules(List(Rule6("2001:db8:5::", "48", "fd00:6::2", "wan1")), IP_TYPE_V6), 0);
+  EXPECT_EQ(OwnRoutes(), "10.20.0.0/16 via 10.6.0.2 dev wan1\n");
+  EXPECT_LT(SetRules(List(Rule4("10.20.0.0", "255.255.0.0", "10.6.0.1", "wan1"))), 0); // this end
+}
+
+TEST_F(StaticRouteTest, Set_TheFolderOfTheTurnIsItsOwnersAlone) {
+  ASSERT_EQ(SetRules(ManyRules(1, "192.168.7.2")), 0);
+  EXPECT_EQ(Shell("stat -c %a /run/vorn /run/vorn/routes.lock"), "700\n600\n");
+}
+
 TEST_F(StaticRouteTest, GetAndSet_AFileThatIsNoneOfOursIsNotTouched) {
   Shell("mkdir -p /etc/iproute2/config");
   for (const char *content : {"not json", "{}", "[1", "[]x"}) {
@@ -247,6 +266,34 @@ TEST_F(StaticRouteTest, Set_ARuleThatStandsMayWaitForItsInterface) {
   EXPECT_EQ(OwnRoutes(), "10.21.0.0/16 via 192.168.7.2 dev lan0\n");
   EXPECT_EQ(GetRules()[0]["reason"], "ifname: no such interface");
   EXPECT_LT(SetRules(List(waiting, Rule4("10.22.0.0", "255.255.0.0", "10.9.0.1", "wan0"))), 0);
+}
+
+TEST_F(StaticRouteTest, Set_ARuleThatIsOffHidesNoneThatWaits) {
+  const Json::Value rules = List(Rule4("10.20.0.0", "255.255.0.0", "10.9.0.1", "wan0"),
+                                 Rule4("10.20.0.0", "255.255.0.0", "192.168.7.2", "lan0", false));
+  ASSERT_EQ(SetRules(rules), 0);
+  Shell("ip link delete wan0");
+  EXPECT_EQ(SetRules(rules), 0);
+}
+
+TEST_F(StaticRouteTest, Set_ARuleThatIsSwitchedOnIsLookedAtWhereItIsToGo) {
+  ASSERT_EQ(SetRules(List(Rule4("10.20.0.0", "255.255.0.0", "10.66.0.1", "wan0", false))), 0);
+  EXPECT_LT(SetRules(List(Rule4("10.20.0.0", "255.255.0.0", "10.66.0.1", "wan0", true))), 0);
+}
+
+TEST_F(StaticRouteTest, Get_NeverSeesAChangeHalfWay) {
+  ASSERT_EQ(SetRules(ManyRules(50, "192.168.7.2")), 0);
+  Child writer([] {
+    for (;;) {
+      SetRules(ManyRules(50, "192.168.7.3"));
+      SetRules(ManyRules(60, "192.168.7.2"));
+    }
+  });
+  for (int round = 0; round < 200; ++round) {
+    for (const Json::Value &rule : GetRules()) {
+      ASSERT_EQ(rule["installed"], true) << round;
+    }
+  }
 }
 
 TEST_F(StaticRouteTest, Get_TellsWhyARuleIsNotInstalled) {
@@ -276,6 +323,9 @@ TEST_F(StaticRouteTest, Restore_MakesTheKernelFollowTheFileEachRuleForItself) {
   Shell("ip route flush proto 86 && ip -6 route flush proto 86");
   Shell("ip route add 10.99.0.0/16 via 192.168.7.2 proto 86");            // left by one that was killed
   Shell("ip route add 10.128.1.0/24 via 192.168.7.77 dev lan0 proto 86"); // the same
+  Shell("ip route append 10.128.1.0/24 via 192.168.7.78 dev lan0 proto 86");
+  Shell("ip -6 route append 2001:db8:5::/48 via fd00:7::77 proto 86");
+  Shell("ip -6 route append 2001:db8:5::/48 via fd00:7::78 proto 86");
   EXPECT_THAT(RestoreRoutes(), IsEmpty());
   EXPECT_EQ(AllRoutes(), before);
   Shell("ip route flush proto 86 && ip route add 10.128.1.0/24 via 192.168.7.9 proto static");
