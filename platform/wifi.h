@@ -36,7 +36,11 @@ public:
   /// @retval <0   no such adapter, or its configuration cannot be read
   int GetAdapterConfig(const std::string &adapter, Json::Value &config);
 
-  /// Writes an adapter's whole configuration and applies it.
+  /// Writes an adapter's whole configuration and applies it. "enabled" and "guest_enabled" tell what is and are passed
+  /// over. "mac_filter_policy" is "disable" (everyone may connect), "allow" (only the list's entries) or "deny" (all
+  /// but them), for the main and the guest network; an entry is an object: "mac" (a station's MAC address), "desc" (a
+  /// text or null), "mac_filter_enabled" (a boolean; null or missing: true). A station that the filter forbids loses
+  /// its connection at once.
   /// @retval >=0  stored, durably, and applied
   /// @retval <0   no such adapter, a value that is not acceptable (nothing is written), or it could not be applied
   int ApplyAdapter(const std::string &adapter, const Json::Value &config);

@@ -24,6 +24,14 @@ constexpr char kPolicyDeny[] = "deny";       // all but the entries may
 ///         std::runtime_error when there is a file that cannot be read or holds no object.
 Json::Value ReadAdapterConfig(const std::string &adapter);
 
+/// @return a configuration as it is stored, without the members that say what is on the air. Throws std::runtime_error
+/// when
+///         reading it would not give it back: a text that is no UTF-8, a nesting that is too deep.
+std::string RenderAdapterConfig(Json::Value config);
+
+/// The path of an adapter's file.
+std::string AdapterFileOf(const std::string &adapter);
+
 } // namespace vornhost
 
 #endif

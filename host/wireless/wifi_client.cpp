@@ -13,6 +13,7 @@ class VORN_EXPORT WifiClient;
 #include "host/utility/log.h"
 #include "host/utility/program_runner.h"
 #include "host/wireless/adapter_config.h"
+#include "host/wireless/adapter_writer.h"
 #include "host/wireless/control_socket.h"
 #include "host/wireless/hostapd_config.h"
 #include "host/wireless/station_facts.h"
@@ -23,6 +24,8 @@ class VORN_EXPORT WifiClient;
 #include <chrono>
 #include <ctime>
 #include <exception>
+#include <stdexcept>
+#include <vector>
 
 namespace vornwireless::dbus {
 
@@ -132,6 +135,25 @@ int Refuse(int code, const std::string &name, const char *why) {
   return vornhost::SetError(code);
 }
 
+using Adapters = std::vector<vornhost::WirelessAdapter>;
+
+// Runs what is to be done with an adapter; a std::runtime_error says what is wrong with its configuration.
+template <typename Body> int ForAdapter(const std::string &name, const Body &body) {
+  return vornhost::Guarded(-1, [&name, &body] {
+    const Adapters adapters = vornhost::ReadAdapters();
+    const vornhost::WirelessAdapter *found = vornhost::FindAdapter(adapters, name);
+    if (found == nullptr) {
+      return Refuse(QARDC_ERR_NOT_FOUND, name, "no such adapter");
+    }
+    try {
+      body(adapters, *found);
+    } catch (const std::runtime_error &error) {
+      return Refuse(QARDC_ERR_BAD_ARGUMENT, name, vornhost::LogText(error.what()).c_str());
+    }
+    return 0;
+  });
+}
+
 } // namespace
 
 WifiClient::WifiClient() = default;
@@ -153,22 +175,18 @@ int WifiClient::GetAdapterList(Json::Value &adapters) {
 }
 
 int WifiClient::GetAdapterConfig(const std::string &adapter, Json::Value &config) {
-  return vornhost::Guarded(-1, [&adapter, &config] {
-    const auto adapters = vornhost::ReadAdapters();
-    const vornhost::WirelessAdapter *found = vornhost::FindAdapter(adapters, adapter);
-    if (found == nullptr) {
-      return Refuse(QARDC_ERR_NOT_FOUND, adapter, "no such adapter");
-    }
-    try {
-      config = vornhost::ReadAdapterConfig(adapter);
-    } catch (const std::runtime_error &error) {
-      return Refuse(QARDC_ERR_SYNTAX, adapter, error.what());
-    }
+  return ForAdapter(adapter, [&config](const Adapters &adapters, const vornhost::WirelessAdapter &found) {
+    config = vornhost::ReadAdapterConfig(found.name);
     const vornhost::Deadline deadline = AnswerDeadline();
-    config[vornhost::kEnabledMember] = IsOn(&found->networks.front(), deadline);
+    config[vornhost::kEnabledMember] = IsOn(&found.networks.front(), deadline);
     config[vornhost::kGuestEnabledMember] =
-        IsOn(vornhost::FindNetwork(adapters, vornhost::GuestNetworkOf(adapter)), deadline);
-    return 0;
+        IsOn(vornhost::FindNetwork(adapters, vornhost::GuestNetworkOf(found.name)), deadline);
+  });
+}
+
+int WifiClient::ApplyAdapter(const std::string &adapter, const Json::Value &config) {
+  return ForAdapter(adapter, [&config](const Adapters &, const vornhost::WirelessAdapter &found) {
+    vornhost::WriteAdapter(found, config);
   });
 }
 
