@@ -55,7 +55,7 @@ void Write(const std::string &path, const std::string &content) {
 } // namespace
 
 UniqueFd TakeRouteTurn() {
-  mkdir(kRunFolder, 0755);
+  mkdir(kRunFolder, 0700); // whoever could open it could hold every change up
   return TakeFileTurn(std::string(kRunFolder) + "/routes.lock", std::chrono::seconds(30));
 }
 
