@@ -23,19 +23,24 @@ public:
   /// @return true when the daemon side can take calls
   bool IsServerReady();
 
-  /// @param[out] adapters  array of adapter names (interface names)
+  /// @param[out] adapters  array of adapter names (interface names), sorted; empty when there is no adapter
   /// @retval >=0  done
-  /// @retval <0   the daemon does not answer
+  /// @retval <0   cannot be read
   int GetAdapterList(Json::Value &adapters);
 
   /// @param[in]  adapter  an adapter's name
   /// @param[out] config   object: the adapter's whole configuration; among its members "enabled", "guest_enabled"
-  ///                      (booleans), "mac_filter_policy" (text), "mac_filter_list" (array)
+  ///                      (booleans: the network is on the air now), "mac_filter_policy" (text), "mac_filter_list"
+  ///                      (array)
   /// @retval >=0  done
   /// @retval <0   no such adapter, or its configuration cannot be read
   int GetAdapterConfig(const std::string &adapter, Json::Value &config);
 
-  /// Writes an adapter's whole configuration and applies it.
+  /// Writes an adapter's whole configuration and applies it. "enabled" and "guest_enabled" tell what is and are passed
+  /// over. "mac_filter_policy" is "disable" (everyone may connect), "allow" (only the list's entries) or "deny" (all
+  /// but them), for the main and the guest network; an entry is an object: "mac" (a station's MAC address), "desc" (a
+  /// text or null), "mac_filter_enabled" (a boolean; null or missing: true). A station that the filter forbids loses
+  /// its connection at once.
   /// @retval >=0  stored, durably, and applied
   /// @retval <0   no such adapter, a value that is not acceptable (nothing is written), or it could not be applied
   int ApplyAdapter(const std::string &adapter, const Json::Value &config);
@@ -43,10 +48,11 @@ public:
   /// The stations of one wireless network.
   /// @param[in]  network   an adapter's name for its main network, "g" + that name for its guest network
   /// @param[out] stations  array of objects: "mac" (lower case, colons) and, where known, "ip", "hostname",
-  ///                       "signalstrength", "transferRX", "transferTX", "asso_time". An "ip" is always a well-formed
-  ///                       address.
+  ///                       "signalstrength" (dBm), "transferRX" and "transferTX" (bytes that the station received
+  ///                       and sent since it associated), "asso_time" (when it was last seen associated, local time as
+  ///                       "%T %Y/%m/%d"). An "ip" is always a well-formed address. Only stations that were let in.
   /// @retval >=0  done
-  /// @retval <0   no such network, or the daemon does not answer
+  /// @retval <0   no such network, or the daemon gives no whole list within 2 seconds
   int GetConnectionList(const std::string &network, Json::Value &stations);
 
   /// Switches the operating topology and waits for the end of the switch. While it runs, "/tmp/topology.lock" exists.

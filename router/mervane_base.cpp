@@ -6,6 +6,7 @@
 #include "platform/utility.h"
 #include "router/gatewaylist.h"
 #include "router/log.h"
+#include "router/macfilter.h"
 #include "router/parameters.h"
 #include "router/parental.h"
 #include "router/portforward.h"
@@ -258,11 +259,45 @@ void SetParentalControl(APIRequest *request, APIResponse *response) {
 }
 
 void GetMacFilter(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+  Json::Value result;
+  MacFilterHandler filter;
+  if (filter.GetRules(result)) {
+    response->SetSuccess(result);
+  } else {
+    response->SetError(kErrorFailed, result);
+  }
 }
 
-void SetMacFilter(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetMacFilter(APIRequest *request, APIResponse *response) {
+  Json::Value parameters;
+  MacFilterHandler filter;
+  if (request->HasParam("mac_filter_policy")) {
+    const auto policy = router::ConvertToText(request->GetParam("mac_filter_policy", Json::Value()));
+    if (!policy) {
+      response->SetError(kErrorFailed, parameters);
+      return;
+    }
+    parameters["mac_filter_policy"] = *policy;
+  }
+  if (request->HasParam("mac_filter_list")) {
+    Json::Value &list = parameters["mac_filter_list"];
+    std::string errors;
+    if (!router::ParseJsonText(request->GetParam("mac_filter_list", Json::Value()), list, errors)) {
+      ROUTER_LOG("%s:%d Error when parsing array, msg: %s", errors.c_str());
+      response->SetError(kErrorFailed, Json::Value());
+      return;
+    }
+    if (!list.isArray()) {
+      ROUTER_LOG("%s:%d Data mac filter list from req is not an json array");
+      response->SetError(kErrorFailed, list);
+      return;
+    }
+  }
+  if (filter.SetRules(parameters)) {
+    response->SetSuccess(Json::Value());
+  } else {
+    response->SetError(kErrorFailed, parameters);
+  }
 }
 
 void GetLocalLan(APIRequest *, APIResponse *response) {

@@ -1,6 +1,7 @@
 #include "host/network/topology_config.h"
 
 #include "host/network/ipv4.h"
+#include "host/network/mac_address.h"
 #include "host/network/names.h"
 #include "host/utility/atomic_file.h"
 #include "host/utility/log.h"
@@ -48,16 +49,7 @@ bool IsNetmask(const std::string &text) {
 }
 
 bool IsMac(const std::string &text) {
-  if (text.size() != 17) {
-    return false;
-  }
-  for (size_t at = 0; at < text.size(); ++at) {
-    const auto byte = static_cast<unsigned char>(text[at]);
-    if (at % 3 == 2 ? byte != ':' : std::isxdigit(byte) == 0) {
-      return false;
-    }
-  }
-  return true;
+  return ParseMac(text).has_value() && text[2] == ':';
 }
 
 std::string ReadAddress(const char *path) {

@@ -4,12 +4,12 @@
 #include "host/packageserver/strict_json.h"
 #include "host/routes/route_rule.h"
 #include "host/utility/atomic_file.h"
+#include "host/utility/file_turn.h"
 #include "host/utility/line_file.h"
 #include "platform/utility.h"
 
 #include <fcntl.h>
 #include <json/writer.h>
-#include <sys/file.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -19,7 +19,6 @@
 #include <chrono>
 #include <cstring>
 #include <stdexcept>
-#include <thread>
 
 namespace vornhost {
 
@@ -72,20 +71,8 @@ void Write(const std::string &path, const std::string &content) {
 } // namespace
 
 UniqueFd TakeRouteTurn() {
-  mkdir(kRunFolder, 0700); // whoever could open the lock could hold every change up
-  const std::string path = std::string(kRunFolder) + "/routes.lock";
-  UniqueFd file(open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
-  if (!file.IsOpen()) {
-    Fail(path, std::strerror(errno));
-  }
-  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-  while (flock(file.Get(), LOCK_EX | LOCK_NB) != 0) {
-    if ((errno != EWOULDBLOCK && errno != EINTR) || std::chrono::steady_clock::now() > deadline) {
-      Fail(path, std::strerror(errno));
-    }
-    std::this_thread::sleep_for(std::chrono::milliseconds(1));
-  }
-  return file;
+  mkdir(kRunFolder, 0700); // whoever could open it could hold every change up
+  return TakeFileTurn(std::string(kRunFolder) + "/routes.lock", std::chrono::seconds(30));
 }
 
 Json::Value ReadRules(int family) {

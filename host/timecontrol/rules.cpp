@@ -1,5 +1,6 @@
 #include "host/timecontrol/rules.h"
 
+#include "host/network/mac_address.h"
 #include "host/schedule/local_time.h"
 #include "host/utility/atomic_file.h"
 #include "host/utility/line_file.h"
@@ -58,16 +59,6 @@ std::optional<TimeRule> MakeRule(const Section &section) {
   return TimeRule{*mac, section.clientName, *section.schedule};
 }
 
-int HexValue(char digit) {
-  if (digit >= '0' && digit <= '9') {
-    return digit - '0';
-  }
-  if (digit >= 'a' && digit <= 'f') {
-    return digit - 'a' + 10;
-  }
-  return digit >= 'A' && digit <= 'F' ? digit - 'A' + 10 : -1;
-}
-
 bool IsRootsFile(const char *path) {
   struct stat info {};
   return lstat(path, &info) == 0 && S_ISREG(info.st_mode) && info.st_uid == 0 &&
@@ -77,29 +68,8 @@ bool IsRootsFile(const char *path) {
 } // namespace
 
 std::optional<std::string> CanonicalMac(std::string_view text) {
-  constexpr size_t kLength = 17;
-  if (text.size() != kLength || (text[2] != ':' && text[2] != '-')) {
-    return {};
-  }
-  std::string mac(text);
-  bool isZero = true;
-  for (size_t at = 0; at < kLength; ++at) {
-    if (at % 3 == 2) {
-      if (text[at] != text[2]) {
-        return {};
-      }
-      mac[at] = ':';
-      continue;
-    }
-    const int value = HexValue(text[at]);
-    if (value < 0) {
-      return {};
-    }
-    mac[at] = "0123456789abcdef"[value];
-    isZero = isZero && value == 0;
-  }
-  const bool isGroup = HexValue(mac[1]) % 2 != 0;
-  return isZero || isGroup ? std::nullopt : std::optional(mac);
+  const auto mac = ParseMac(text);
+  return mac && IsStationMac(*mac) ? mac : std::nullopt;
 }
 
 bool IsMarked(const std::string &schedule, int slot) {

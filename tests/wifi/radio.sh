@@ -1,0 +1,209 @@
+# shellcheck shell=bash
+# What the checks over simulated radios are made of. REQUIRES: lab/lib/look.sh, $root, $build, $api.
+# shellcheck disable=SC2154,SC2034
+
+readonly PHONE=1 LAPTOP=2 TABLET=3 # the numbers of their radios
+readonly work=/tmp/radio
+hostapd=
+server=
+
+station_mac() { # STATION: as mac80211_hwsim numbers them
+  printf '02:00:00:00:%02x:00' "$1"
+}
+
+macs_of() { # STATION...: in order, a blank between
+  local station macs=()
+  for station in "$@"; do
+    macs+=("$(station_mac "$station")")
+  done
+  echo "${macs[*]}"
+}
+
+# ---- the router
+
+prepare_router() {
+  local station
+  mkdir -p "$work" /etc/hostapd /var/lib/misc /usr/vorn/sbin
+  ip link set lo up
+  rm -rf /etc/hostapd/*.conf /etc/vorn/wireless /var/lib/misc/dnsmasq.leases
+  # The country would need a database of regulations; without one, the kernel has the channels that all countries permit.
+  sed '/^country_code=/d; /^ieee80211d=/d' "$root/packaging/hostapd-wlan0.conf" >/etc/hostapd/wlan0.conf
+  cp "$build/programs/vorntopology" /usr/vorn/sbin/
+  make_bridge lbr0 192.168.1.1/24
+  make_bridge gbr0 192.168.2.1/24
+  dnsmasq --conf-file="$root/packaging/dnsmasq.conf" --no-ping --user=root --no-resolv --log-facility="$work/dnsmasq.log"
+  for station in "$PHONE" "$LAPTOP" "$TABLET"; do
+    ip netns add "station$station"
+    iw phy "phy$station" set netns name "station$station" # the radio moves; an interface alone could not
+    in_station "$station" ip link set lo up
+  done
+}
+
+make_bridge() { # NAME ADDRESS
+  ip link add "$1" type bridge
+  ip address add "$2" dev "$1"
+  ip link set "$1" up
+}
+
+start_hostapd() {
+  hostapd -t -f "$work/hostapd.log" /etc/hostapd/wlan0.conf &
+  hostapd=$!
+  eventually 20 networks_are_on
+}
+
+networks_are_on() {
+  hostapd_cli -p /run/hostapd -i gwlan0 status 2>/dev/null | grep -q '^state=ENABLED'
+}
+
+start_server() {
+  "$build/webapi/vornwebd" --module "$build/router/router.so" --listen "$api" 2>>"$work/server.log" &
+  server=$!
+  eventually 20 server_answers
+}
+
+server_answers() {
+  call MacFilter 1 get | sed -n 1p | jq -e .success >/dev/null 2>&1
+}
+
+restart_everything() {
+  kill -KILL "$hostapd" "$server"
+  wait "$hostapd" "$server" 2>/dev/null
+  start_hostapd && start_server
+}
+
+# ---- stations
+
+in_station() { # STATION COMMAND...
+  ip netns exec "station$1" "${@:2}"
+}
+
+supplicant() { # STATION COMMAND...
+  in_station "$1" wpa_cli -p "$work/supplicant$1" -i "wlan$1" "${@:2}"
+}
+
+# One frequency, so that nobody has to look at all the others first.
+start_supplicant() { # STATION SSID PASSPHRASE
+  cat >"$work/supplicant$1.conf" <<CONF
+ctrl_interface=$work/supplicant$1
+network={
+  ssid="$2"
+  psk="$3"
+  key_mgmt=WPA-PSK
+  scan_freq=2437
+}
+CONF
+  in_station "$1" wpa_supplicant -B -t -f "$work/supplicant$1.log" -P "$work/supplicant$1.pid" -D nl80211 -i "wlan$1" \
+    -c "$work/supplicant$1.conf" >/dev/null
+}
+
+is_authorized() { # STATION NETWORK
+  hostapd_cli -p /run/hostapd -i "$2" sta "$(station_mac "$1")" 2>/dev/null | grep -qF '[AUTHORIZED]'
+}
+
+join() { # STATION SSID PASSPHRASE NETWORK
+  start_supplicant "$1" "$2" "$3"
+  eventually 40 is_authorized "$1" "$4"
+}
+
+is_linked() { # STATION: as the station itself sees it
+  supplicant "$1" status | grep -q '^wpa_state=COMPLETED'
+}
+
+has_kept_link() { # STATION
+  is_linked "$1" && ! grep -q CTRL-EVENT-DISCONNECTED "$work/supplicant$1.log"
+}
+
+# After a refusal a station waits for a while before it tries again; this one is told to try now.
+try_again() { # STATION
+  supplicant "$1" bssid_ignore clear >/dev/null
+  supplicant "$1" select_network 0 >/dev/null
+}
+
+rejoins() { # STATION NETWORK
+  is_authorized "$1" "$2" && is_linked "$1" && return 0
+  try_again "$1"
+  eventually 40 is_authorized "$1" "$2"
+}
+
+# The access point says no to a try that is made now.
+is_rejected() { # STATION
+  : >"$work/supplicant$1.log"
+  try_again "$1"
+  eventually 40 grep -q CTRL-EVENT-AUTH-REJECT "$work/supplicant$1.log" && ! is_linked "$1"
+}
+
+take_address() { # STATION
+  cat >"$work/udhcpc.script" <<'SCRIPT'
+#!/bin/sh
+[ "$1" = bound ] && ip address replace "$ip/$mask" dev "$interface"
+exit 0
+SCRIPT
+  chmod 755 "$work/udhcpc.script"
+  in_station "$1" busybox udhcpc -i "wlan$1" -n -q -t 10 -T 2 -x "hostname:device$1" -s "$work/udhcpc.script" \
+    >/dev/null 2>&1 || return 1
+  in_station "$1" ip -4 -o address show dev "wlan$1" | grep -q 'inet 192\.168\.'
+}
+
+ping_router() { # STATION
+  in_station "$1" busybox ping -q -c 5 -W 3 192.168.1.1 >/dev/null
+}
+
+# The laptop of a neighbour, who guesses.
+wrong_key_is_not_listed() {
+  local result
+  kill "$(cat "$work/supplicant$LAPTOP.pid")"
+  eventually 10 not is_authorized "$LAPTOP" wlan0 || return 1
+  start_supplicant "$LAPTOP" home wrong-secret-9
+  eventually 40 grep -q "POSSIBLE-PSK-MISMATCH $(station_mac "$LAPTOP")" "$work/hostapd.log" &&
+    same "$(macs_of "$PHONE")" "$(listed wlan0)"
+  result=$?
+  kill "$(cat "$work/supplicant$LAPTOP.pid")"
+  eventually 10 not test -e "$work/supplicant$LAPTOP/wlan$LAPTOP"
+  : >"$work/supplicant$LAPTOP.log"
+  join "$LAPTOP" home change-this-1 wlan0 && return "$result"
+}
+
+# ---- what the platform and the API tell
+
+probe() { # stations NETWORK | config ADAPTER
+  "$build/tests/wifi/wifi_probe" "$@" 2>>"$work/probe.log"
+}
+
+stations() { # NETWORK
+  probe stations "$1"
+}
+
+gives_no_list() { # NETWORK
+  ! stations "$1" >/dev/null
+}
+
+listed() { # NETWORK: the MAC addresses, in order
+  stations "$1" | jq -r '[.[].mac] | sort | join(" ")'
+}
+
+member_of() { # NETWORK STATION MEMBER
+  stations "$1" | jq -r --arg mac "$(station_mac "$2")" --arg member "$3" '.[] | select(.mac == $mac) | .[$member]'
+}
+
+told_whole() { # NETWORK STATION ADDRESS-PATTERN
+  stations "$1" | jq -e --arg mac "$(station_mac "$2")" --arg ip "^$3" --arg name "device$2" \
+    --arg today "$(date +%Y/%m/%d)" 'map(select(.mac == $mac)) | length == 1 and (.[0] |
+      (.ip | test($ip)) and .hostname == $name and .signalstrength < 0 and .signalstrength > -100 and
+      .transferRX > 100 and .transferTX > 100 and (.asso_time | test("^[0-9:]{8} " + $today + "$")))' >/dev/null ||
+    { stations "$1" >&2; return 1; }
+}
+
+set_filter() { # POLICY LIST
+  local body answer
+  body=$(jq -nc --arg policy "$1" --arg list "$2" '{mac_filter_policy: $policy, mac_filter_list: $list}')
+  answer=$(call MacFilter 1 set "$body" | sed -n 1p)
+  jq -e .success <<<"$answer" >/dev/null || { echo "# set: $answer" >&2; return 1; }
+}
+
+filter_is() { # POLICY LIST
+  local answer
+  answer=$(call MacFilter 1 get | sed -n 1p)
+  jq -e --arg policy "$1" --argjson list "$2" \
+    '.success and .data == {mac_filter_policy: $policy, mac_filter_list: $list}' <<<"$answer" >/dev/null ||
+    { echo "# get: $answer" >&2; return 1; }
+}

@@ -1,0 +1,38 @@
+#!/usr/bin/env bash
+# The wireless platform over simulated radios: boots Debian's kernel in an emulator, without KVM, and runs checks.sh there as
+# root on a view of this machine's files. Needs no root. Prints a line for each check.
+# VORN_RADIO_REQUIRED=1: what is missing here is a failure instead of a skipped test.
+set -uo pipefail
+
+here=$(cd "${BASH_SOURCE[0]%/*}" && pwd -P)
+. "$here/kernel.sh"
+build=${VORN_BUILD:?"set VORN_BUILD to the build folder"}
+readonly SECONDS_LIMIT=${VORN_RADIO_SECONDS:-330} # a loaded machine needs several times the half minute of an idle one
+
+skip() { # REASON
+  echo "SKIP: $1"
+  [ "${VORN_RADIO_REQUIRED:-}" = 1 ] && exit 1
+  exit 77 # CTest's mark of a skipped test
+}
+
+for program in qemu-system-x86_64 cpio busybox depmod xz hostapd wpa_supplicant iw dnsmasq jq curl; do
+  PATH=$PATH:/usr/sbin:/sbin command -v "$program" >/dev/null || skip "$program is not installed"
+done
+export PATH=$PATH:/usr/sbin:/sbin
+
+kernel=$(prepare_kernel "$build/radio-kernel") || skip "Debian's kernel cannot be had"
+out=$(mktemp -d "$build/radio-out.XXXXXX")
+trap 'rm -rf "$out"' EXIT
+
+memory=384
+grep -q '^VORN_SANITIZE:[A-Z]*=.' "$build/CMakeCache.txt" && memory=1024
+
+# Not "-machine microvm", whose boot hangs now and then, and not KVM, which is not to be had everywhere.
+timeout -k 5 "$SECONDS_LIMIT" qemu-system-x86_64 -nodefaults -no-user-config -display none -no-reboot -machine q35 \
+  -accel tcg,tb-size=128 -cpu max -smp 1 -m "$memory" -kernel "$kernel/vmlinux" -initrd "$kernel/initrd.gz" \
+  -append "console=ttyS0 quiet panic=-1 mitigations=off radios=4 checks=$here/checks.sh build=$build" -serial stdio \
+  -fsdev local,id=host,path=/,security_model=none,readonly=on,multidevs=remap -device virtio-9p-pci,fsdev=host,mount_tag=host \
+  -fsdev local,id=out,path="$out",security_model=none -device virtio-9p-pci,fsdev=out,mount_tag=out </dev/null | tr -d '\r'
+
+status=$(cat "$out/status" 2>/dev/null) || { echo "FAIL the checks did not come to their end"; exit 1; }
+exit "$status"
