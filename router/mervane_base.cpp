@@ -4,6 +4,8 @@
 #include "platform/network.h"
 #include "platform/packageserver.h"
 #include "platform/utility.h"
+#include "router/clhandler.h"
+#include "router/connectionlist.h"
 #include "router/gatewaylist.h"
 #include "router/log.h"
 #include "router/parameters.h"
@@ -16,6 +18,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
 
 using router::kErrorFailed;
 using router::kErrorParameter;
@@ -62,6 +65,7 @@ VORN::APIEntry *GetAPITable() {
 namespace {
 
 constexpr char kUnit[] = "mervane_base";
+constexpr char kAllDevices[] = "all"; // a scanner type and a net range
 constexpr char kTopologyLock[] = "/tmp/topology.lock";
 
 void AnswerTopology(APIResponse *response, int version) {
@@ -121,6 +125,15 @@ bool CanBeKept(const Json::Value &rule) {
          IsOneLine(router::WholeTextOf(router::MemberOf(rule, "schedule")));
 }
 
+// @param[in] failed  0: done
+void AnswerDevices(APIResponse *response, int failed, const Json::Value &result) {
+  if (failed == 0) {
+    response->SetSuccess(result);
+  } else {
+    response->SetError(kErrorFailed, result);
+  }
+}
+
 // For the rows whose subject this version does not have yet.
 void AnswerNotBuilt(APIResponse *response) {
   response->SetError(kErrorFailed, Json::Value());
@@ -171,20 +184,51 @@ void GetRecommandPkgList(APIRequest *request, APIResponse *response) {
   }
 }
 
-void GetConnectionList(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void GetConnectionList(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  ConnectionList connections;
+  ConnectionListHandler devices;
+  const auto scannerType = router::TextParameter(*request, "scannertype");
+  if (!scannerType) {
+    connections.GetList(request, response);
+    return;
+  }
+  const std::string netRange = router::TextParameter(*request, "netrange").value_or(kAllDevices);
+  const int failed = devices.GetList(*scannerType, netRange, result);
+  AnswerDevices(response, failed, result);
 }
 
-void SetConnectionListData(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetConnectionListData(APIRequest *request, APIResponse *response) {
+  ConnectionListHandler devices;
+  std::vector<std::string> texts;
+  for (const char *name : {"mac", "hostname", "type"}) {
+    auto text = router::TextParameter(*request, name);
+    if (!text) {
+      response->SetError(kErrorParameter, Json::Value());
+      return;
+    }
+    texts.push_back(*std::move(text));
+  }
+  AnswerDevices(response, devices.SetDevice(texts[0], texts[1], texts[2]), Json::Value());
 }
 
-void DelConnectionListData(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void DelConnectionListData(APIRequest *request, APIResponse *response) {
+  ConnectionListHandler devices;
+  const auto mac = router::TextParameter(*request, "mac");
+  if (!mac) {
+    response->SetError(kErrorParameter, Json::Value());
+    return;
+  }
+  AnswerDevices(response, devices.DelDevice(*mac), Json::Value());
 }
 
-void GetConnectionListCount(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void GetConnectionListCount(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  ConnectionListHandler devices;
+  const std::string scannerType = router::TextParameter(*request, "scannertype").value_or(kAllDevices);
+  const std::string netRange = router::TextParameter(*request, "netrange").value_or(kAllDevices);
+  const int failed = devices.GetOnlineDeviceNumber(scannerType, netRange, result);
+  AnswerDevices(response, failed, result);
 }
 
 void GetPortForward(APIRequest *, APIResponse *response) {
