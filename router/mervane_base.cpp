@@ -4,6 +4,8 @@
 #include "platform/network.h"
 #include "platform/packageserver.h"
 #include "platform/utility.h"
+#include "router/clhandler.h"
+#include "router/connectionlist.h"
 #include "router/gatewaylist.h"
 #include "router/log.h"
 #include "router/macfilter.h"
@@ -17,6 +19,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
 
 using router::kErrorFailed;
 using router::kErrorParameter;
@@ -63,6 +66,7 @@ VORN::APIEntry *GetAPITable() {
 namespace {
 
 constexpr char kUnit[] = "mervane_base";
+constexpr char kAllDevices[] = "all"; // a scanner type and a net range
 constexpr char kTopologyLock[] = "/tmp/topology.lock";
 
 void AnswerTopology(APIResponse *response, int version) {
@@ -75,15 +79,27 @@ void AnswerTopology(APIResponse *response, int version) {
   }
 }
 
-// The getters that answer a failure with what they have so far.
-void AnswerPortForward(APIResponse *response, bool (PortForward::*get)(Json::Value &)) {
-  Json::Value result;
-  PortForward portForward;
-  if ((portForward.*get)(result)) {
+// A failure carries what there is of the result.
+void AnswerResult(APIResponse *response, bool done, const Json::Value &result) {
+  if (done) {
     response->SetSuccess(result);
   } else {
     response->SetError(kErrorFailed, result);
   }
+}
+
+void AnswerChange(APIResponse *response, bool done, const Json::Value &failure = Json::Value()) {
+  if (done) {
+    response->SetSuccess(Json::Value());
+  } else {
+    response->SetError(kErrorFailed, failure);
+  }
+}
+
+void AnswerPortForward(APIResponse *response, bool (PortForward::*get)(Json::Value &)) {
+  Json::Value result;
+  PortForward portForward;
+  AnswerResult(response, (portForward.*get)(result), result);
 }
 
 // Reads the array that the text parameter "rules" holds, when there is one, into the member of that name.
@@ -105,26 +121,6 @@ bool ReadRules(const APIRequest *request, APIResponse *response, Json::Value &pa
     return false;
   }
   return true;
-}
-
-// Whether the text reaches a line of the rule file as it is.
-bool IsOneLine(const std::optional<std::string> &text) {
-  return text && text->find_first_of("\r\n") == std::string::npos;
-}
-
-// A rule that the rule file would not hold is found before anything is stopped or written: it must not end the
-// enforcement of the others. The address names a section, so it stands between brackets; whether it is one is the
-// enforcing program's business.
-bool CanBeKept(const Json::Value &rule) {
-  const auto mac = router::WholeTextOf(router::MemberOf(rule, "mac"));
-  return IsOneLine(mac) && !mac->empty() && mac->find_first_of("[] \t") == std::string::npos &&
-         IsOneLine(router::WholeTextOf(router::MemberOf(rule, "clientname"))) &&
-         IsOneLine(router::WholeTextOf(router::MemberOf(rule, "schedule")));
-}
-
-// For the rows whose subject this version does not have yet.
-void AnswerNotBuilt(APIResponse *response) {
-  response->SetError(kErrorFailed, Json::Value());
 }
 
 } // namespace
@@ -172,20 +168,51 @@ void GetRecommandPkgList(APIRequest *request, APIResponse *response) {
   }
 }
 
-void GetConnectionList(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void GetConnectionList(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  ConnectionList connections;
+  ConnectionListHandler devices;
+  const auto scannerType = router::TextParameter(*request, "scannertype");
+  if (!scannerType) {
+    connections.GetList(request, response);
+    return;
+  }
+  const std::string netRange = router::TextParameter(*request, "netrange").value_or(kAllDevices);
+  const int failed = devices.GetList(*scannerType, netRange, result);
+  AnswerResult(response, failed == 0, result);
 }
 
-void SetConnectionListData(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void SetConnectionListData(APIRequest *request, APIResponse *response) {
+  ConnectionListHandler devices;
+  std::vector<std::string> texts;
+  for (const char *name : {"mac", "hostname", "type"}) {
+    auto text = router::TextParameter(*request, name);
+    if (!text) {
+      response->SetError(kErrorParameter, Json::Value());
+      return;
+    }
+    texts.push_back(*std::move(text));
+  }
+  AnswerChange(response, devices.SetDevice(texts[0], texts[1], texts[2]) == 0);
 }
 
-void DelConnectionListData(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void DelConnectionListData(APIRequest *request, APIResponse *response) {
+  ConnectionListHandler devices;
+  const auto mac = router::TextParameter(*request, "mac");
+  if (!mac) {
+    response->SetError(kErrorParameter, Json::Value());
+    return;
+  }
+  AnswerChange(response, devices.DelDevice(*mac) == 0);
 }
 
-void GetConnectionListCount(APIRequest *, APIResponse *response) {
-  AnswerNotBuilt(response);
+void GetConnectionListCount(APIRequest *request, APIResponse *response) {
+  Json::Value result;
+  ConnectionListHandler devices;
+  const std::string scannerType = router::TextParameter(*request, "scannertype").value_or(kAllDevices);
+  const std::string netRange = router::TextParameter(*request, "netrange").value_or(kAllDevices);
+  const int failed = devices.GetOnlineDeviceNumber(scannerType, netRange, result);
+  AnswerResult(response, failed == 0, result);
 }
 
 void GetPortForward(APIRequest *, APIResponse *response) {
@@ -198,11 +225,8 @@ void SetPortForward(APIRequest *request, APIResponse *response) {
   if (!ReadRules(request, response, parameters)) {
     return;
   }
-  if (portForward.SetPortForward(parameters)) {
-    response->SetSuccess(Json::Value());
-  } else {
-    response->SetError(kErrorFailed, parameters["rules"]);
-  }
+  const bool done = portForward.SetPortForward(parameters); // which looks whether there are rules
+  AnswerChange(response, done, parameters["rules"]);
 }
 
 void GetDMZ(APIRequest *, APIResponse *response) {
@@ -217,21 +241,13 @@ void SetDMZ(APIRequest *request, APIResponse *response) {
       parameters[name] = request->GetParam(name, Json::Value());
     }
   }
-  if (portForward.SetDMZ(parameters)) {
-    response->SetSuccess(Json::Value());
-  } else {
-    response->SetError(kErrorFailed, parameters);
-  }
+  AnswerChange(response, portForward.SetDMZ(parameters), parameters);
 }
 
 void GetParentalControl(APIRequest *, APIResponse *response) {
   Json::Value result;
   const ParentalHandler parental;
-  if (parental.LoadTimeControlData(result)) {
-    response->SetSuccess(result);
-  } else {
-    response->SetError(kErrorFailed, result);
-  }
+  AnswerResult(response, parental.LoadTimeControlData(result), result);
 }
 
 void SetParentalControl(APIRequest *request, APIResponse *response) {
@@ -245,27 +261,19 @@ void SetParentalControl(APIRequest *request, APIResponse *response) {
     return;
   }
   const Json::Value &rules = parameters["rules"];
-  const auto refused = std::find_if_not(rules.begin(), rules.end(), CanBeKept);
+  const auto refused = std::find_if_not(rules.begin(), rules.end(), CanKeepTimeRule);
   if (refused != rules.end()) {
     ROUTER_LOG("%s:%d Rule %u is refused, not all of its texts can be kept", refused.index());
     response->SetError(kErrorFailed, Json::Value());
     return;
   }
-  if (parental.StopTimeCtrlRules() && parental.SetTimeCtrlConfig() && parental.StartTimeCtrlRules()) {
-    response->SetSuccess(Json::Value());
-  } else {
-    response->SetError(kErrorFailed, Json::Value());
-  }
+  AnswerChange(response, parental.StopTimeCtrlRules() && parental.SetTimeCtrlConfig() && parental.StartTimeCtrlRules());
 }
 
 void GetMacFilter(APIRequest *, APIResponse *response) {
   Json::Value result;
   MacFilterHandler filter;
-  if (filter.GetRules(result)) {
-    response->SetSuccess(result);
-  } else {
-    response->SetError(kErrorFailed, result);
-  }
+  AnswerResult(response, filter.GetRules(result), result);
 }
 
 void SetMacFilter(APIRequest *request, APIResponse *response) {
@@ -293,11 +301,7 @@ void SetMacFilter(APIRequest *request, APIResponse *response) {
       return;
     }
   }
-  if (filter.SetRules(parameters)) {
-    response->SetSuccess(Json::Value());
-  } else {
-    response->SetError(kErrorFailed, parameters);
-  }
+  AnswerChange(response, filter.SetRules(parameters), parameters);
 }
 
 void GetLocalLan(APIRequest *, APIResponse *response) {
@@ -340,11 +344,7 @@ void SetGatewayList(APIRequest *request, APIResponse *response) {
     response->SetError(kErrorParameter, Json::Value());
     return;
   }
-  if (gateways.Set(*family, names)) {
-    response->SetSuccess(Json::Value());
-  } else {
-    response->SetError(kErrorFailed, names);
-  }
+  AnswerChange(response, gateways.Set(*family, names), names);
 }
 
 // The static routes. Their parameters are read all at once, and a fault in them is told in words.

@@ -56,9 +56,13 @@ std::optional<std::string> TextOf(const Json::Value &value) {
   return value.asString();
 }
 
+bool IsWhole(const std::string &text) {
+  return text.find('\0') == std::string::npos;
+}
+
 std::optional<std::string> WholeTextOf(const Json::Value &value) {
   auto text = TextOf(value);
-  return text && text->find('\0') == std::string::npos ? text : std::nullopt;
+  return text && IsWhole(*text) ? text : std::nullopt;
 }
 
 std::optional<std::string> ConvertToText(const Json::Value &value) {
@@ -79,8 +83,16 @@ const Json::Value &MemberOf(const Json::Value &value, const char *name) {
   return value.isObject() ? value[name] : Json::Value::nullSingleton();
 }
 
+std::string MemberText(const Json::Value &value, const char *name) {
+  return ConvertToText(MemberOf(value, name)).value_or("");
+}
+
+std::optional<std::string> TextParameter(const VORN::APIRequest &request, const char *name) {
+  return request.HasParam(name) ? TextOf(request.GetParam(name, Json::Value())) : std::nullopt;
+}
+
 bool ParseJson(const std::string &text, Json::Value &value, std::string &errors) {
-  if (text.find('\0') != std::string::npos) { // the reader takes it for the end
+  if (!IsWhole(text)) { // the reader takes it for the end
     errors = "a NUL in the text";
     return false;
   }

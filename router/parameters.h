@@ -20,6 +20,9 @@ enum ErrorCode {
 /// @return the value's text, untouched; nothing when it is no text
 std::optional<std::string> TextOf(const Json::Value &value);
 
+/// @return whether a C function would read the text to its end: a NUL in it would cut it
+bool IsWhole(const std::string &text);
+
 /// For a text that goes into a C function.
 /// @return the value's text; nothing when it is no text, or holds a NUL, at which it would be cut
 std::optional<std::string> WholeTextOf(const Json::Value &value);
@@ -34,6 +37,12 @@ std::optional<bool> ConvertToBool(const Json::Value &value);
 
 /// @return the member of that name; null when there is none or the value is no object
 const Json::Value &MemberOf(const Json::Value &value, const char *name);
+
+/// @return the member of that name, converted to a text; empty when there is none or it has no text
+std::string MemberText(const Json::Value &value, const char *name);
+
+/// @return the text of a request's parameter; nothing when it has none of that name or that is no text
+std::optional<std::string> TextParameter(const VORN::APIRequest &request, const char *name);
 
 /// @return whether the value is an array of texts that a C function would read to their end, no two of them the same
 bool IsTextSet(const Json::Value &value);

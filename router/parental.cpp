@@ -12,6 +12,7 @@
 #include <cstdio>
 #include <cstring>
 #include <memory>
+#include <optional>
 #include <string>
 
 namespace {
@@ -44,6 +45,11 @@ using List = std::unique_ptr<QARDCSzList, ListFree>;
 
 std::string TextMember(const Json::Value &rule, const char *name) {
   return router::WholeTextOf(router::MemberOf(rule, name)).value_or("");
+}
+
+// Whether the text reaches a line of the rule file as it is.
+bool IsOneLine(const std::optional<std::string> &text) {
+  return text && text->find_first_of("\r\n") == std::string::npos;
 }
 
 bool FillHash(QARDCSzHash *hash, const Json::Value &rule) {
@@ -113,6 +119,13 @@ bool EnforceSection(const char *section, QARDCSzHash *hash) {
 }
 
 } // namespace
+
+bool CanKeepTimeRule(const Json::Value &rule) {
+  const auto mac = router::WholeTextOf(router::MemberOf(rule, "mac"));
+  return IsOneLine(mac) && !mac->empty() && mac->find_first_of("[] \t") == std::string::npos &&
+         IsOneLine(router::WholeTextOf(router::MemberOf(rule, "clientname"))) &&
+         IsOneLine(router::WholeTextOf(router::MemberOf(rule, "schedule")));
+}
 
 ParentalHandler::ParentalHandler() : timeCtrlDataValid_(0) {}
 

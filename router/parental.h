@@ -6,6 +6,12 @@
 
 #include <json/value.h>
 
+/// Whether the rule file would hold the rule's texts as they are. One that it would not is found before anything is
+/// stopped or written: it must not end the enforcement of the others. The address names a section, so it stands between
+/// brackets; whether it is one is the enforcing program's business.
+/// @param[in] rule  an element of "rules"
+bool CanKeepTimeRule(const Json::Value &rule);
+
 class ROUTER_EXPORT ParentalHandler {
 public:
   ParentalHandler();

@@ -2,13 +2,11 @@
 #include "router/macfilter.h"
 #include "router/mervane_base.h"
 #include "tests/router/scripted_platform.h"
-#include "tests/router/scripted_wireless.h"
 
 #include <gmock/gmock.h>
 
 using scripted::Exchange;
 using scripted::Get;
-using scripted::GetWireless;
 using scripted::Parse;
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -28,9 +26,8 @@ class MacFilterTest : public testing::Test {
 protected:
   void SetUp() override {
     scripted::Reset();
-    scripted::ResetWireless();
-    GetWireless().adapters = Parse(R"(["wlan0","wlan1","wlan2"])");
-    GetWireless().configs = {{"wlan0", Parse(R"({"channel":6,"enabled":true,"mac_filter_list":[],
+    Get().adapters = Parse(R"(["wlan0","wlan1","wlan2"])");
+    Get().adapterConfigs = {{"wlan0", Parse(R"({"channel":6,"enabled":true,"mac_filter_list":[],
                                               "mac_filter_policy":"disable"})")},
                              {"wlan1", Parse(R"({"ssid":"five"})")},
                              {"wlan2", Parse("{}")}};
@@ -74,29 +71,29 @@ protected:
 };
 
 TEST_F(MacFilterTest, Get_ShowsTheFirstAdaptersFilterOnly) {
-  GetWireless().configs["wlan0"] = Parse(
+  Get().adapterConfigs["wlan0"] = Parse(
       R"({"mac_filter_policy":"deny","mac_filter_list":[{"mac":"02:00:00:00:01:00","desc":"tv","mac_filter_enabled":true},
           {"mac":"02:00:00:00:02:00","desc":"","mac_filter_enabled":false}],"enabled":true})");
-  GetWireless().configs["wlan1"] = Parse(R"({"mac_filter_policy":"allow","mac_filter_list":[{"mac":"x"}]})");
+  Get().adapterConfigs["wlan1"] = Parse(R"({"mac_filter_policy":"allow","mac_filter_list":[{"mac":"x"}]})");
   const std::string answer = GetAnswer();
   EXPECT_EQ(answer, R"(SetSuccess({"mac_filter_list":[)"
                     R"({"desc":"tv","mac":"02:00:00:00:01:00","mac_filter_enabled":true},)"
                     R"({"desc":"","mac":"02:00:00:00:02:00","mac_filter_enabled":false}],)"
                     R"("mac_filter_policy":"deny"}))");
-  EXPECT_THAT(Get().calls, ElementsAre("WifiClient()", "IsServerReady()", "GetAdapterList()",
+  EXPECT_THAT(Get().calls, ElementsAre("WifiClient()", "IsServerReady()", "GetAdapterList(null)",
                                        "GetAdapterConfig(wlan0, null)", "~WifiClient()", answer));
   EXPECT_THAT(Get().log, IsEmpty());
 }
 
 TEST_F(MacFilterTest, Get_CopiesValuesOfAnyTypeWithoutLookingAtThem) {
-  GetWireless().configs["wlan0"] =
+  Get().adapterConfigs["wlan0"] =
       Parse(R"({"mac_filter_policy":7,"mac_filter_list":[{"mac":[1],"desc":null,"mac_filter_enabled":"yes"}]})");
   EXPECT_EQ(GetAnswer(), R"(SetSuccess({"mac_filter_list":[{"desc":null,"mac":[1],"mac_filter_enabled":"yes"}],)"
                          R"("mac_filter_policy":7}))");
 }
 
 TEST_F(MacFilterTest, Get_UnknownKeysOfEntriesNeverAppearAndMissingOnesAreNull) {
-  GetWireless().configs["wlan0"] =
+  Get().adapterConfigs["wlan0"] =
       Parse(R"({"mac_filter_policy":"deny","mac_filter_list":[{"mac":"a","vlan":3},5,"text",null]})");
   EXPECT_EQ(GetAnswer(), R"(SetSuccess({"mac_filter_list":[{"desc":null,"mac":"a","mac_filter_enabled":null},)"
                          R"({"desc":null,"mac":null,"mac_filter_enabled":null},)"
@@ -107,7 +104,7 @@ TEST_F(MacFilterTest, Get_UnknownKeysOfEntriesNeverAppearAndMissingOnesAreNull) 
 TEST_F(MacFilterTest, Get_ConfigurationWithoutAFilterIsANullPolicyAndAnEmptyList) {
   for (const char *config :
        {"{}", "null", R"({"mac_filter_list":{"0":{"mac":"a"}}})", R"({"mac_filter_list":"x"})", "[]", "5"}) {
-    GetWireless().configs["wlan0"] = Parse(config);
+    Get().adapterConfigs["wlan0"] = Parse(config);
     EXPECT_EQ(GetAnswer(), R"(SetSuccess({"mac_filter_list":[],"mac_filter_policy":null}))") << config;
   }
 }
@@ -120,26 +117,26 @@ TEST_F(MacFilterTest, Get_DaemonNotReadyAnswers4300WithAnEmptyList) {
 }
 
 TEST_F(MacFilterTest, Get_UnreadableAdapterListAnswers4300WithAnEmptyList) {
-  GetWireless().adapterListResult = -1;
+  Get().results["GetAdapterList(null)"] = -1;
   EXPECT_EQ(GetAnswer(), kNothing);
   EXPECT_THAT(Get().calls,
-              ElementsAre("WifiClient()", "IsServerReady()", "GetAdapterList()", "~WifiClient()", kNothing));
+              ElementsAre("WifiClient()", "IsServerReady()", "GetAdapterList(null)", "~WifiClient()", kNothing));
   EXPECT_THAT(Get().log, ElementsAre(kNoList, kNoConfig));
 }
 
 TEST_F(MacFilterTest, Get_WithoutAdaptersAnswers4300WithAnEmptyList) {
   for (const char *adapters : {"[]", "null", R"({"0":"wlan0"})", R"("wlan0")", "1"}) {
     scripted::Reset();
-    GetWireless().adapters = Parse(adapters);
+    Get().adapters = Parse(adapters);
     EXPECT_EQ(GetAnswer(), kNothing) << adapters;
     EXPECT_THAT(Get().calls,
-                ElementsAre("WifiClient()", "IsServerReady()", "GetAdapterList()", "~WifiClient()", kNothing));
+                ElementsAre("WifiClient()", "IsServerReady()", "GetAdapterList(null)", "~WifiClient()", kNothing));
     EXPECT_THAT(Get().log, ElementsAre(kEmptyList, kNoConfig));
   }
 }
 
 TEST_F(MacFilterTest, Get_UnreadableFirstAdapterAnswers4300WithAnEmptyListAndTriesNoOther) {
-  GetWireless().configs.erase("wlan0");
+  Get().adapterConfigs.erase("wlan0");
   EXPECT_EQ(GetAnswer(), kNothing);
   EXPECT_THAT(CallsOf("GetAdapterConfig"), ElementsAre("GetAdapterConfig(wlan0, null)"));
   EXPECT_THAT(Get().log, ElementsAre(kFirst, kNoConfig));
@@ -154,7 +151,7 @@ TEST_F(MacFilterTest, Set_WritesTheSameFilterToEveryAdapterAndKeepsTheOtherKeys)
   EXPECT_THAT(Get().calls,
               ElementsAre("HasParam(mac_filter_policy)", "GetParam(mac_filter_policy, null)",
                           "HasParam(mac_filter_list)", "GetParam(mac_filter_list, null)", "WifiClient()",
-                          "IsServerReady()", "GetAdapterList()", "GetAdapterConfig(wlan0, null)",
+                          "IsServerReady()", "GetAdapterList(null)", "GetAdapterConfig(wlan0, null)",
                           R"(ApplyAdapter(wlan0, {"channel":6,"enabled":true,)" + filter + "})",
                           "GetAdapterConfig(wlan1, null)", "ApplyAdapter(wlan1, {" + filter + R"(,"ssid":"five"}))",
                           "GetAdapterConfig(wlan2, null)", "ApplyAdapter(wlan2, {" + filter + "})", "~WifiClient()",
@@ -172,7 +169,7 @@ TEST_F(MacFilterTest, Set_WithoutEitherParameterWritesANullPolicyAndAnEmptyList)
 }
 
 TEST_F(MacFilterTest, Set_EmptyListClearsTheListInEveryAdapter) {
-  for (auto &[name, config] : GetWireless().configs) {
+  for (auto &[name, config] : Get().adapterConfigs) {
     config = Parse(R"({"mac_filter_policy":"deny","mac_filter_list":[{"mac":"a"}]})");
   }
   EXPECT_EQ(SetAnswer(Parameters("deny", "[]")), "SetSuccess(null)");
@@ -183,8 +180,8 @@ TEST_F(MacFilterTest, Set_EmptyListClearsTheListInEveryAdapter) {
 }
 
 TEST_F(MacFilterTest, Set_AdapterThatCannotBeReadIsSkippedAndTheAnswerIsSuccess) {
-  GetWireless().adapters = Parse(R"(["wlan0","wlan1"])");
-  GetWireless().configs.erase("wlan0");
+  Get().adapters = Parse(R"(["wlan0","wlan1"])");
+  Get().adapterConfigs.erase("wlan0");
   EXPECT_EQ(SetAnswer(Parameters("allow", "[]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("ApplyAdapter"),
               ElementsAre(R"(ApplyAdapter(wlan1, {"mac_filter_list":[],"mac_filter_policy":"allow","ssid":"five"}))"));
@@ -192,22 +189,22 @@ TEST_F(MacFilterTest, Set_AdapterThatCannotBeReadIsSkippedAndTheAnswerIsSuccess)
 }
 
 TEST_F(MacFilterTest, Set_AllAdaptersSkippedIsSuccessToo) {
-  GetWireless().configs.clear();
+  Get().adapterConfigs.clear();
   EXPECT_EQ(SetAnswer(Parameters("allow", "[]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("ApplyAdapter"), IsEmpty());
   EXPECT_EQ(Get().log.size(), 3U);
 }
 
 TEST_F(MacFilterTest, Set_ConfigurationThatIsNoObjectIsSkipped) {
-  GetWireless().configs["wlan0"] = Parse("[]");
-  GetWireless().configs["wlan1"] = Parse(R"("text")");
+  Get().adapterConfigs["wlan0"] = Parse("[]");
+  Get().adapterConfigs["wlan1"] = Parse(R"("text")");
   EXPECT_EQ(SetAnswer(Parameters("allow", "[]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("ApplyAdapter"),
               ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[],"mac_filter_policy":"allow"}))"));
 }
 
 TEST_F(MacFilterTest, Set_FailureOnTheSecondAdapterKeepsTheFirstAndLeavesTheThird) {
-  GetWireless().applyResults["wlan1"] = -1;
+  Get().applyResults["wlan1"] = -1;
   EXPECT_EQ(SetAnswer(Parameters("deny", R"([{"mac":"a","vlan":3}])")),
             R"(SetError(4300, {"mac_filter_list":[{"mac":"a","vlan":3}],"mac_filter_policy":"deny"}))");
   EXPECT_THAT(CallsOf("ApplyAdapter"), ElementsAre(HasSubstr("wlan0"), HasSubstr("wlan1")));
@@ -226,16 +223,16 @@ TEST_F(MacFilterTest, Set_DaemonNotReadyAnswers4300WithTheParameters) {
 }
 
 TEST_F(MacFilterTest, Set_AdapterListThatFailsOrIsEmptyAnswers4300) {
-  GetWireless().adapterListResult = -1;
+  Get().results["GetAdapterList(null)"] = -1;
   EXPECT_EQ(SetAnswer(Parameters("deny", nullptr)), R"(SetError(4300, {"mac_filter_policy":"deny"}))");
-  GetWireless().adapterListResult = 0;
-  GetWireless().adapters = Parse(R"({"0":"wlan0"})");
+  Get().results.clear();
+  Get().adapters = Parse(R"({"0":"wlan0"})");
   EXPECT_EQ(SetAnswer(Parameters("deny", nullptr)), R"(SetError(4300, {"mac_filter_policy":"deny"}))");
   EXPECT_THAT(Get().log, ElementsAre(kNoList, kNoWrite, kEmptyList, kNoWrite));
 }
 
 TEST_F(MacFilterTest, Set_AdapterNameThatIsNoTextNamesNone) {
-  GetWireless().adapters = Parse(R"([{"name":"wlan0"},["wlan1"]])");
+  Get().adapters = Parse(R"([{"name":"wlan0"},["wlan1"]])");
   EXPECT_EQ(SetAnswer(Parameters("deny", "[]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("GetAdapterConfig"), ElementsAre("GetAdapterConfig(, null)", "GetAdapterConfig(, null)"));
 }
@@ -271,10 +268,10 @@ TEST_F(MacFilterTest, Set_ListNestedTooDeeplyIsNoJson) {
 }
 
 TEST_F(MacFilterTest, Set_PolicyIsTakenAsText) {
-  GetWireless().adapters = Parse(R"(["wlan2"])");
+  Get().adapters = Parse(R"(["wlan2"])");
   for (const auto &[value, text] :
        std::map<std::string, std::string>{{"7", "7"}, {"true", "true"}, {"null", ""}, {R"("d\ne<b>")", R"(d\ne<b>)"}}) {
-    scripted::Reset();
+    Get().calls.clear();
     Json::Value parameters(Json::objectValue);
     parameters["mac_filter_policy"] = Parse(value);
     EXPECT_EQ(SetAnswer(parameters), "SetSuccess(null)");
@@ -293,7 +290,7 @@ TEST_F(MacFilterTest, Set_PolicyThatHasNoTextAnswers4300AndAsksNobody) {
 }
 
 TEST_F(MacFilterTest, Set_EntriesThatAreNoObjectsHaveNullMembers) {
-  GetWireless().adapters = Parse(R"(["wlan2"])");
+  Get().adapters = Parse(R"(["wlan2"])");
   EXPECT_EQ(SetAnswer(Parameters("deny", R"([1,"a",null,["b"]])")), "SetSuccess(null)");
   const std::string null = R"({"desc":null,"mac":null,"mac_filter_enabled":null})";
   EXPECT_THAT(CallsOf("ApplyAdapter"), ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[)" + null + "," + null +
@@ -301,7 +298,7 @@ TEST_F(MacFilterTest, Set_EntriesThatAreNoObjectsHaveNullMembers) {
 }
 
 TEST_F(MacFilterTest, Set_TwoThousandEntriesArePassedOnWhole) {
-  GetWireless().adapters = Parse(R"(["wlan2"])");
+  Get().adapters = Parse(R"(["wlan2"])");
   std::string list = "[";
   for (int i = 0; i < 2000; ++i) {
     list += R"({"desc":"line\nend <b>","mac":"x","mac_filter_enabled":true})";
@@ -313,7 +310,7 @@ TEST_F(MacFilterTest, Set_TwoThousandEntriesArePassedOnWhole) {
 }
 
 TEST_F(MacFilterTest, Set_CommentsInTheListAreNotKept) {
-  GetWireless().adapters = Parse(R"(["wlan2"])");
+  Get().adapters = Parse(R"(["wlan2"])");
   EXPECT_EQ(SetAnswer(Parameters("deny", "[ // one\n {\"mac\":\"a\"} /* two */ ]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("ApplyAdapter"), ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[{"desc":null,)"
                                                    R"("mac":"a","mac_filter_enabled":null}],)"

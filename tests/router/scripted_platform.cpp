@@ -138,6 +138,11 @@ void Exchange::Run(VORN::APIHandler handler) {
   handler(&parts_->request, &parts_->response);
 }
 
+void Exchange::RunTask() {
+  parts_->responseState.answers.clear();
+  Get().startedTask(&parts_->request, &parts_->response, Get().startedContext);
+}
+
 void Exchange::RunCallbacks() {
   for (const auto &[function, data] : std::exchange(parts_->responseState.callbacks, {})) {
     function(data);
@@ -151,6 +156,10 @@ const std::string &Exchange::Answer() const {
 
 size_t Exchange::AnswerCount() const {
   return parts_->responseState.answers.size();
+}
+
+const std::vector<std::string> &Exchange::Answers() const {
+  return parts_->responseState.answers;
 }
 
 } // namespace scripted

@@ -75,6 +75,20 @@ struct Platform {
   int setKeyValueResult = 0;
   int refreshResult = 0;
 
+  Json::Value deviceList = Json::Value(Json::objectValue); ///< what GetDeviceListData gives out
+
+  Json::Value adapters = Json::Value(Json::arrayValue);
+  std::map<std::string, Json::Value> adapterConfigs; ///< by adapter; one that is not here cannot be read
+  std::map<std::string, int> applyResults;           ///< by adapter; what ApplyAdapter gives back instead of success
+  std::map<std::string, Json::Value> wifiStations;   ///< by network; one that is not here cannot be read
+
+  Json::Value tasks = Json::Value(Json::objectValue); ///< what APIPolling::List gives out
+  Json::Value taskStatus;                             ///< what APIPolling::Status gives out
+  int pollError = 0;                                  ///< List and Status fail with it when it is not 0
+  Json::Value startReply;                             ///< what APIPolling::Start answers
+  void (*startedTask)(VORN::APIRequest *, VORN::APIResponse *, void *) = nullptr; ///< what was last given to Start
+  void *startedContext = nullptr;
+
   int routeResult = 0;   ///< of the static-route call that the test makes
   Json::Value routeData; ///< what that call gives out
 
@@ -108,11 +122,15 @@ public:
   Exchange &operator=(const Exchange &) = delete;
 
   void Run(VORN::APIHandler handler);
+  /// Runs the task that was last started, with this exchange as the task's own.
+  void RunTask();
   /// Runs what the handler registered for after the answer.
   void RunCallbacks();
   /// "SetSuccess(...)" or "SetError(...)" of the last Run.
   const std::string &Answer() const;
   size_t AnswerCount() const;
+  /// Those of the last Run or RunTask, in order.
+  const std::vector<std::string> &Answers() const;
 
 private:
   struct Parts;

@@ -63,7 +63,10 @@ int QARDNetInterfaceEnum(QARDNetInterface *entries, int capacity, int kind) {
   const int count = Call("QARDNetInterfaceEnum(" + std::to_string(capacity) + ", " + std::to_string(kind) + ")",
                          std::min(capacity, static_cast<int>(lans.size())));
   for (int i = 0; i < count && i < capacity; ++i) {
-    Copy(lans[static_cast<size_t>(i)].name, entries[i].name, sizeof(entries[i].name));
+    const scripted::Lan &lan = lans[static_cast<size_t>(i)];
+    Copy(lan.name, entries[i].name, sizeof(entries[i].name));
+    Copy(lan.ip, entries[i].ip, sizeof(entries[i].ip));
+    Copy(lan.mask, entries[i].mask, sizeof(entries[i].mask));
   }
   return count;
 }

@@ -1,12 +1,9 @@
-#include "tests/router/scripted_wireless.h"
-
+// The scripted platform's wireless daemon: adapters, their configurations and stations.
 #include "platform/wifi.h"
 #include "tests/router/scripted_platform.h"
 
 namespace scripted {
 namespace {
-
-Wireless current;
 
 int Find(const std::map<std::string, Json::Value> &values, const std::string &name, Json::Value &out) {
   const auto found = values.find(name);
@@ -18,44 +15,37 @@ int Find(const std::map<std::string, Json::Value> &values, const std::string &na
 }
 
 } // namespace
-
-Wireless &GetWireless() {
-  return current;
-}
-
-void ResetWireless() {
-  current = Wireless();
-}
-
 } // namespace scripted
 
 using scripted::Call;
-using scripted::GetWireless;
+using scripted::Get;
 using scripted::Text;
 
 namespace vornwireless::dbus {
 
 int WifiClient::GetAdapterList(Json::Value &adapters) {
-  Call("GetAdapterList()");
-  adapters = GetWireless().adapters;
-  return GetWireless().adapterListResult;
+  const int result = Call("GetAdapterList(" + Text(adapters) + ")");
+  if (result >= 0) {
+    adapters = Get().adapters;
+  }
+  return result;
 }
 
 int WifiClient::GetAdapterConfig(const std::string &adapter, Json::Value &config) {
-  Call("GetAdapterConfig(" + adapter + ", " + Text(config) + ")");
-  return scripted::Find(GetWireless().configs, adapter, config);
+  const int result = Call("GetAdapterConfig(" + adapter + ", " + Text(config) + ")");
+  return result < 0 ? result : scripted::Find(Get().adapterConfigs, adapter, config);
 }
 
 int WifiClient::ApplyAdapter(const std::string &adapter, const Json::Value &config) {
   Call("ApplyAdapter(" + adapter + ", " + Text(config) + ")");
-  const auto &results = GetWireless().applyResults;
+  const auto &results = Get().applyResults;
   const auto found = results.find(adapter);
   return found == results.end() ? 0 : found->second;
 }
 
 int WifiClient::GetConnectionList(const std::string &network, Json::Value &stations) {
-  Call("GetConnectionList(" + network + ", " + Text(stations) + ")");
-  return scripted::Find(GetWireless().stations, network, stations);
+  const int result = Call("GetConnectionList(" + network + ", " + Text(stations) + ")");
+  return result < 0 ? result : scripted::Find(Get().wifiStations, network, stations);
 }
 
 } // namespace vornwireless::dbus

@@ -80,7 +80,7 @@ void CopyReadable(const fs::path &from, const fs::path &to) {
   std::error_code ignored;
   const auto options = fs::directory_options::skip_permission_denied;
   for (fs::recursive_directory_iterator it(from, options, ignored), end; it != end; it.increment(ignored)) {
-    const fs::path target = to / fs::relative(it->path(), from);
+    const fs::path target = to / it->path().lexically_relative(from); // fs::relative would follow links
     if (it->is_symlink(ignored)) {
       fs::copy_symlink(it->path(), target, ignored);
     } else if (it->is_directory(ignored)) {
@@ -103,6 +103,7 @@ void MakeWritable(const std::string &folder) {
     Mount(upper, folder, nullptr, MS_BIND);
   } else {
     fs::create_directories(upper + "/vorn");
+    fs::create_directories(upper + "/bin"); // a folder of its own is one in which programs can be replaced
     Mount("overlay", folder, "overlay", 0, "lowerdir=" + folder + ",upperdir=" + upper + ",workdir=" + work);
   }
 }
