@@ -1,6 +1,7 @@
 #include "host/network/network_state.h"
 
 #include "host/network/ipv4.h"
+#include "host/network/kernel_setting.h"
 #include "host/utility/log.h"
 
 #include <linux/if_link.h>
@@ -55,17 +56,20 @@ std::vector<std::string> NetworkState::PortsOf(const std::string &bridge) {
 
 void NetworkState::EnsureBridge(const std::string &name, const std::string &mac) {
   const std::optional<Link> link = netlink_.FindLink(name);
-  if (!link) {
-    netlink_.CreateBridge(name, mac);
-    return;
-  }
-  if (link->kind != "bridge") {
+  if (link && link->kind != "bridge") {
     throw NetlinkError(name + " is no bridge", EEXIST);
   }
-  netlink_.ForwardAtOnce(link->index);
-  if (!mac.empty() && link->mac != mac) {
-    netlink_.SetMac(link->index, mac);
+  if (!link) {
+    netlink_.CreateBridge(name, mac);
+  } else {
+    netlink_.ForwardAtOnce(link->index);
+    if (!mac.empty() && link->mac != mac) {
+      netlink_.SetMac(link->index, mac);
+    }
   }
+  // An answer to a probe makes an entry in the neighbour table, also where there is none: without it an idle device
+  // whose entry is taken away to be asked for anew would be missing from then on (kernel: ip-sysctl, arp_accept).
+  WriteSetting("/proc/sys/net/ipv4/conf/" + name + "/arp_accept", "1");
 }
 
 void NetworkState::RemoveBridge(const std::string &name) {

@@ -1,6 +1,7 @@
 #include "host/network/topology.h"
 
 #include "host/network/dhcp_client.h"
+#include "host/network/kernel_setting.h"
 #include "host/network/names.h"
 #include "host/network/network_state.h"
 #include "host/network/topology_config.h"
@@ -20,15 +21,6 @@
 namespace vornhost {
 
 namespace {
-
-// A setting that this kernel does not have, or that may not be changed here, stays as it is.
-void WriteSetting(const std::string &path, const std::string &value) {
-  std::string now;
-  std::getline(std::ifstream(path), now);
-  if (!now.empty() && now != value) {
-    std::ofstream(path) << value;
-  }
-}
 
 bool HasIpv4(Netlink &netlink, int index) {
   const std::vector<Address> addresses = netlink.Addresses();

@@ -47,28 +47,28 @@ std::optional<int> ParseLength(const std::string &text, int family) {
   return length;
 }
 
-std::optional<RuleFault> DestinationFault(const IpNetwork &destination, const char *lengthField) {
+std::optional<RouteFault> DestinationFault(const IpNetwork &destination, const char *lengthField) {
   if (destination.GetLength() == 0) {
-    return RuleFault{lengthField, "the default route belongs to the gateway list"};
+    return RouteFault{lengthField, "the default route belongs to the gateway list"};
   }
   if (destination.HasHostBits()) {
-    return RuleFault{"ip", "host bits are set"};
+    return RouteFault{"ip", "host bits are set"};
   }
   if (IsReserved(destination)) {
-    return RuleFault{"ip", "not a network that can be routed to"};
+    return RouteFault{"ip", "not a network that can be routed to"};
   }
   return std::nullopt;
 }
 
-RuleFault AddressFault(const char *field, const std::string &text, int family) {
+RouteFault AddressFault(const char *field, const std::string &text, int family) {
   const bool isOther = IpNetwork::Parse(text, family == AF_INET ? AF_INET6 : AF_INET).has_value();
   return {field, isOther ? "an address of the other family" : "no address"};
 }
 
-std::optional<RuleFault> TextFault(const Json::Value &object, const char *field, std::string &text) {
+std::optional<RouteFault> TextFault(const Json::Value &object, const char *field, std::string &text) {
   const Json::Value &member = object[field];
   if (!member.isNull() && !member.isString()) {
-    return RuleFault{field, "no text"};
+    return RouteFault{field, "no text"};
   }
   text = member.asString();
   return std::nullopt;
@@ -80,9 +80,9 @@ bool IsRoutableName(const std::string &name) {
   return IsInterfaceName(name) && name[0] != '-' && name != "lo";
 }
 
-std::optional<RuleFault> ReadRuleTexts(const Json::Value &object, int family, RuleTexts &texts) {
+std::optional<RouteFault> ReadRuleTexts(const Json::Value &object, int family, RuleTexts &texts) {
   if (!object.isObject()) {
-    return RuleFault{"rule", "no object"};
+    return RouteFault{"rule", "no object"};
   }
   const char *lengthField = family == AF_INET ? "mask" : "prefix_length";
   for (const auto &[field, text] : {std::pair("ip", &texts.ip), std::pair(lengthField, &texts.length),
@@ -93,13 +93,13 @@ std::optional<RuleFault> ReadRuleTexts(const Json::Value &object, int family, Ru
   }
   const Json::Value &enabled = object["enable"];
   if (!enabled.isNull() && !enabled.isBool()) {
-    return RuleFault{"enable", "neither true nor false"};
+    return RouteFault{"enable", "neither true nor false"};
   }
   texts.enabled = enabled.asBool();
   return std::nullopt;
 }
 
-std::optional<RuleFault> ParseRule(const RuleTexts &texts, int family, RouteRule &rule) {
+std::optional<RouteFault> ParseRule(const RuleTexts &texts, int family, RouteRule &rule) {
   const char *lengthField = family == AF_INET ? "mask" : "prefix_length";
   auto destination = IpNetwork::Parse(texts.ip, family);
   if (!destination) {
@@ -107,7 +107,7 @@ std::optional<RuleFault> ParseRule(const RuleTexts &texts, int family, RouteRule
   }
   const auto length = ParseLength(texts.length, family);
   if (!length) {
-    return RuleFault{lengthField, family == AF_INET ? "no netmask" : "no prefix length of 1 to 128"};
+    return RouteFault{lengthField, family == AF_INET ? "no netmask" : "no prefix length of 1 to 128"};
   }
   destination = destination->WithLength(*length);
   if (auto fault = DestinationFault(*destination, lengthField)) {
@@ -122,7 +122,7 @@ std::optional<RuleFault> ParseRule(const RuleTexts &texts, int family, RouteRule
     rule.gateway = gateway->GetText();
   }
   if (!IsRoutableName(texts.ifname)) {
-    return RuleFault{"ifname", "no interface name"};
+    return RouteFault{"ifname", "no interface name"};
   }
   rule.family = family;
   rule.destination = destination->GetText();
@@ -131,7 +131,7 @@ std::optional<RuleFault> ParseRule(const RuleTexts &texts, int family, RouteRule
   return std::nullopt;
 }
 
-Surroundings::Surroundings(Netlink &netlink) {
+RouteSurroundings::RouteSurroundings(Netlink &netlink) {
   for (Link &link : netlink.Links()) {
     links_.emplace(link.name, std::move(link));
   }
@@ -144,23 +144,23 @@ Surroundings::Surroundings(Netlink &netlink) {
   }
 }
 
-const Link *Surroundings::Find(const std::string &name) const {
+const Link *RouteSurroundings::Find(const std::string &name) const {
   const auto found = links_.find(name);
   return found == links_.end() ? nullptr : &found->second;
 }
 
-std::optional<RuleFault> Surroundings::FaultOf(const RouteRule &rule) const {
+std::optional<RouteFault> RouteSurroundings::FaultOf(const RouteRule &rule) const {
   const Link *link = Find(rule.ifname);
   if (link == nullptr) {
-    return RuleFault{"ifname", "no such interface"};
+    return RouteFault{"ifname", "no such interface"};
   }
   if (!link->up) {
-    return RuleFault{"ifname", "the interface is down"};
+    return RouteFault{"ifname", "the interface is down"};
   }
   return GatewayFault(rule, *link);
 }
 
-std::optional<RuleFault> Surroundings::GatewayFault(const RouteRule &rule, const Link &link) const {
+std::optional<RouteFault> RouteSurroundings::GatewayFault(const RouteRule &rule, const Link &link) const {
   if (rule.gateway.empty()) {
     return std::nullopt;
   }
@@ -169,15 +169,15 @@ std::optional<RuleFault> Surroundings::GatewayFault(const RouteRule &rule, const
   bool onLink = kLinkLocal6.Contains(gateway);
   for (const auto &[index, own, subnet] : neighbourhoods_) {
     if (own.IsSameAddress(gateway)) {
-      return RuleFault{"gateway", "an address of this router"};
+      return RouteFault{"gateway", "an address of this router"};
     }
     if (index == link.index && subnet.IsEdge(gateway)) {
-      return RuleFault{"gateway", "the subnet's own address or its broadcast address"};
+      return RouteFault{"gateway", "the subnet's own address or its broadcast address"};
     }
     onLink = onLink || (index == link.index && subnet.Contains(gateway));
   }
   if (!onLink) {
-    return RuleFault{"gateway", "not on the interface's link"};
+    return RouteFault{"gateway", "not on the interface's link"};
   }
   return std::nullopt;
 }

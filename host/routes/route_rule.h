@@ -22,7 +22,7 @@ namespace vornhost {
 constexpr int kStaticRouteProtocol = 86;
 
 /// What is wrong with a rule.
-struct RuleFault {
+struct RouteFault {
   std::string field; ///< the member's name
   std::string reason;
 };
@@ -51,23 +51,23 @@ struct RouteRule {
 bool IsRoutableName(const std::string &name);
 
 /// @return the fault, or nothing when `texts` was filled
-std::optional<RuleFault> ReadRuleTexts(const Json::Value &object, int family, RuleTexts &texts);
+std::optional<RouteFault> ReadRuleTexts(const Json::Value &object, int family, RuleTexts &texts);
 
 /// Looks at the rule alone. @return the fault, or nothing when `rule` was filled
-std::optional<RuleFault> ParseRule(const RuleTexts &texts, int family, RouteRule &rule);
+std::optional<RouteFault> ParseRule(const RuleTexts &texts, int family, RouteRule &rule);
 
 /// The links and addresses of one moment.
-class Surroundings {
+class RouteSurroundings {
 public:
-  explicit Surroundings(Netlink &netlink);
+  explicit RouteSurroundings(Netlink &netlink);
 
   /// @return why the rule's route cannot be in the kernel now; nothing when it can
-  std::optional<RuleFault> FaultOf(const RouteRule &rule) const;
+  std::optional<RouteFault> FaultOf(const RouteRule &rule) const;
   /// @return null when there is none
   const Link *Find(const std::string &name) const;
 
 private:
-  std::optional<RuleFault> GatewayFault(const RouteRule &rule, const Link &link) const;
+  std::optional<RouteFault> GatewayFault(const RouteRule &rule, const Link &link) const;
 
   std::unordered_map<std::string, Link> links_;
   struct Neighbourhood {

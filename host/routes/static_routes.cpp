@@ -39,12 +39,12 @@ bool SharePlace(const Route &one, const Route &other) {
   return one.destination == other.destination && one.metric == other.metric;
 }
 
-void LogFault(Json::ArrayIndex at, const RuleFault &fault) {
+void LogFault(Json::ArrayIndex at, const RouteFault &fault) {
   LogError("static route %u: %s: %s: the list is refused", at + 1, fault.field.c_str(), fault.reason.c_str());
 }
 
 // A rule's whole way from JSON. @return the fault, or nothing when `rule` was filled
-std::optional<RuleFault> ToRule(const Json::Value &object, int family, RouteRule &rule) {
+std::optional<RouteFault> ToRule(const Json::Value &object, int family, RouteRule &rule) {
   RuleTexts texts;
   if (auto fault = ReadRuleTexts(object, family, texts)) {
     return fault;
@@ -63,27 +63,27 @@ std::vector<RouteRule> GoodRules(const Json::Value &rules, int family) {
   return out;
 }
 
-const RuleFault kDuplicate = {"ip", "duplicate of another rule's network"};
+const RouteFault kDuplicate = {"ip", "duplicate of another rule's network"};
 
 } // namespace
 
 Json::Value StaticRoutes::List() {
   Json::Value rules = ReadRules(family_);
-  const Surroundings surroundings(netlink_);
+  const RouteSurroundings surroundings(netlink_);
   std::set<RouteKey> present;
   for (const Route &route : OwnOf(netlink_.RoutesOf(family_, RT_TABLE_MAIN))) {
     present.insert(KeyOf(route));
   }
   for (Json::Value &object : rules) {
     RouteRule rule;
-    std::optional<RuleFault> fault = ToRule(object, family_, rule);
+    std::optional<RouteFault> fault = ToRule(object, family_, rule);
     if (!fault && !rule.enabled) {
       fault = {"enable", "switched off"};
     }
     const Link *link = fault ? nullptr : surroundings.Find(rule.ifname);
     const bool installed = link != nullptr && present.contains(KeyOf(RouteOfRule(rule, *link)));
     if (!installed && !fault) {
-      fault = surroundings.FaultOf(rule).value_or(RuleFault{"ip", "the kernel does not have the route"});
+      fault = surroundings.FaultOf(rule).value_or(RouteFault{"ip", "the kernel does not have the route"});
     }
     if (object.isObject()) {
       object["installed"] = installed;
@@ -96,7 +96,7 @@ Json::Value StaticRoutes::List() {
   return rules;
 }
 
-bool StaticRoutes::Accept(const Json::Value &rules, const Json::Value &stored, const Surroundings &surroundings,
+bool StaticRoutes::Accept(const Json::Value &rules, const Json::Value &stored, const RouteSurroundings &surroundings,
                           Json::Value &fresh) const {
   if (!rules.isArray() || rules.size() > kRuleLimit) {
     LogError("static routes: no list, or one of more than %zu rules", kRuleLimit);
@@ -112,7 +112,7 @@ bool StaticRoutes::Accept(const Json::Value &rules, const Json::Value &stored, c
   fresh = Json::Value(Json::arrayValue);
   for (const Json::Value &object : rules) {
     RouteRule rule;
-    std::optional<RuleFault> fault = ToRule(object, family_, rule);
+    std::optional<RouteFault> fault = ToRule(object, family_, rule);
     if (!fault && rule.enabled) {
       // A rule that stands already may wait for its interface; a new one is looked at where it is to go.
       const auto old = known.find(rule.destination);
@@ -134,7 +134,7 @@ bool StaticRoutes::Accept(const Json::Value &rules, const Json::Value &stored, c
   return true;
 }
 
-std::vector<Route> StaticRoutes::Wanted(const Json::Value &rules, const Surroundings &surroundings) const {
+std::vector<Route> StaticRoutes::Wanted(const Json::Value &rules, const RouteSurroundings &surroundings) const {
   std::vector<Route> wanted;
   for (const RouteRule &rule : GoodRules(rules, family_)) {
     if (rule.enabled && !surroundings.FaultOf(rule)) {
@@ -208,7 +208,7 @@ void StaticRoutes::Undo(const Step &step) {
 }
 
 bool StaticRoutes::Replace(const Json::Value &rules) {
-  const Surroundings surroundings(netlink_);
+  const RouteSurroundings surroundings(netlink_);
   Json::Value fresh;
   if (!Accept(rules, ReadRules(family_), surroundings, fresh)) {
     return false;
@@ -224,7 +224,7 @@ bool StaticRoutes::Replace(const Json::Value &rules) {
   return sequence.Run() == StepSequence::Outcome::kDone;
 }
 
-std::optional<RuleFault> StaticRoutes::FaultOf(const RuleTexts &texts) {
+std::optional<RouteFault> StaticRoutes::FaultOf(const RuleTexts &texts) {
   RouteRule rule;
   if (auto fault = ParseRule(texts, family_, rule)) {
     return fault;
@@ -237,12 +237,12 @@ std::optional<RuleFault> StaticRoutes::FaultOf(const RuleTexts &texts) {
       return other == rule ? std::nullopt : std::optional(kDuplicate);
     }
   }
-  return Surroundings(netlink_).FaultOf(rule);
+  return RouteSurroundings(netlink_).FaultOf(rule);
 }
 
 std::vector<std::string> StaticRoutes::Install() {
   std::vector<std::string> refused;
-  for (const Step &step : Difference(Wanted(ReadRules(family_), Surroundings(netlink_)))) {
+  for (const Step &step : Difference(Wanted(ReadRules(family_), RouteSurroundings(netlink_)))) {
     try {
       Do(step);
     } catch (const NetlinkError &error) {

@@ -30,7 +30,7 @@ public:
   bool Replace(const Json::Value &rules);
 
   /// Looks whether a list of the stored rules and this one would be taken. One that is stored already may be.
-  std::optional<RuleFault> FaultOf(const RuleTexts &texts);
+  std::optional<RouteFault> FaultOf(const RuleTexts &texts);
 
   /// Makes the kernel's routes follow the file: those rules that can be in the kernel now, each for itself.
   /// @return what the kernel refused, a text for each
@@ -46,9 +46,9 @@ private:
   };
 
   bool IsReplaceable(const std::vector<Route> &all, const Route &old) const;
-  bool Accept(const Json::Value &rules, const Json::Value &stored, const Surroundings &surroundings,
+  bool Accept(const Json::Value &rules, const Json::Value &stored, const RouteSurroundings &surroundings,
               Json::Value &fresh) const;
-  std::vector<Route> Wanted(const Json::Value &rules, const Surroundings &surroundings) const;
+  std::vector<Route> Wanted(const Json::Value &rules, const RouteSurroundings &surroundings) const;
   std::vector<Step> Difference(const std::vector<Route> &wanted);
   void Do(const Step &step);
   void Undo(const Step &step);

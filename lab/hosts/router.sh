@@ -35,4 +35,5 @@ start() {
   ip address add 2001:db8:2::1/64 dev lbr0 # the provider routes this prefix here; a switch takes it away with lbr0
   dnsmasq --conf-file=/etc/dnsmasq.d/vorn.conf --dhcp-hostsfile=/etc/vorn/addresses --no-ping \
     --log-facility="$LOG/router-dnsmasq"
+  launch vorndevices /usr/vorn/sbin/vorndevices watch # as vorn-devices.service does
 }
