@@ -87,7 +87,13 @@ std::optional<std::string> LineFormat::Render(std::string_view key, std::string_
   }
   std::string text = parts_[0];
   text.append(key).append(parts_[1]).append(value).append(parts_[2]);
-  const Line line = ParseLine(std::string_view(text).substr(0, text.size() - 1));
+  Line line = ParseLine(std::string_view(text).substr(0, text.size() - 1));
+  if (line.kind == Line::Kind::kPair && line.key == key && line.value != value) {
+    // The reader would take something of the value's ends away, blanks or quotes of its own: it stands in quotes then.
+    text = parts_[0];
+    text.append(key).append(parts_[1]).append("\"").append(value).append("\"").append(parts_[2]);
+    line = ParseLine(std::string_view(text).substr(0, text.size() - 1));
+  }
   if (line.kind != Line::Kind::kPair || line.key != key || line.value != value) {
     return {};
   }
