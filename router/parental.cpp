@@ -146,7 +146,7 @@ bool ParentalHandler::SetTimeCtrlConfig() const {
     ROUTER_LOG("%s:%d Failed to mkdir %s", kFolder);
     return false;
   }
-  if (QARDCSysUnlink(kUserRules) < 0) {
+  if (QARDCSysUnlink(kUserRules) < 0 && QARDCFileExist(kUserRules) != 0) {
     ROUTER_LOG("%s:%d Failed to delete %s", kUserRules);
     return false;
   }

@@ -189,7 +189,6 @@ const std::vector<FailingStep> kFailingSteps = {
     {kUnloadModules,
      {std::string(kTool) + "--rmmod timectrl xt_tcpudp.ko xt_mac.ko iptable_filter.ko ip_tables.ko x_tables.ko"},
      {}},
-    {kWrite[1], {"parental: Failed to delete /etc/parental/timectrl.ui.conf"}, {}},
     {kWrite[2], {kNoMemory}, {}},
     {kWrite[3], {kNoMemory}, kFreeFirst},
     {kWrite[4], {kNoMemory}, kFreeFirst},
@@ -212,6 +211,14 @@ const std::vector<FailingStep> kFailingSteps = {
     {kEnforce[4], {"parental: Failed to execute /tmp/vorntimecontrol --schedule"}, {}},
 };
 INSTANTIATE_TEST_SUITE_P(EveryStep, FailingStepTest, testing::ValuesIn(kFailingSteps));
+
+TEST_F(ParentalTest, Set_RuleFileThatCannotBeDeletedAnswers4300) {
+  Get().existingFiles = {kUserRules};
+  Get().results[kWrite[1]] = -1;
+  EXPECT_EQ(SetTwoRules(false), kFailure);
+  EXPECT_THAT(Get().calls, ElementsAreArray(Join({kRead, {kStop[0], kWrite[0], kWrite[1], kSetUp[0], kFailure}})));
+  EXPECT_THAT(Get().log, ElementsAre("parental: Failed to delete /etc/parental/timectrl.ui.conf"));
+}
 
 TEST_F(ParentalTest, SetTimeCtrlRules_NoMemoryForTheHashIsAFailure) {
   Get().results["QARDCSzHashAlloc(1024)"] = -1;
