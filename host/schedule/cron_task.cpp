@@ -18,7 +18,8 @@ namespace {
 
 constexpr char kFolder[] = "/etc/cron.d/";
 constexpr char kHeader[] = "# Written by the router's scheduler; changes are lost.\n";
-constexpr size_t kCommandLimit = 998; // cron's MAX_COMMAND is 1000
+constexpr char kRunner[] = "/usr/vorn/sbin/vornrun "; // runs only what is root's: a command may lie in /tmp
+constexpr size_t kCommandLimit = 960;                 // cron's MAX_COMMAND is 1000
 constexpr size_t kNameLimit = 100;
 constexpr int kEveryDay = 127;
 
@@ -69,15 +70,19 @@ bool IsInRange(const VORNScheduleRecord &record) {
          record.intervalHours <= 24 && record.reserved[0] == 0 && record.reserved[1] == 0;
 }
 
-bool IsOurs(const std::string &content) {
-  return content.compare(0, sizeof(kHeader) - 1, kHeader) == 0;
+// An empty file is nobody's.
+bool MayReplace(const std::string &content) {
+  return content.empty() || content.compare(0, sizeof(kHeader) - 1, kHeader) == 0;
 }
 
-// Cron reads a file only when it is root's and nobody else may write it; one that it would pass over is made anew.
+// Cron reads a file only when it is root's and nobody else may write it; one of ours that it would pass over is made
+// anew.
 int RemoveUnreadable(const std::string &path) {
   struct stat info {};
+  std::string content;
   if (lstat(path.c_str(), &info) != 0 || !S_ISREG(info.st_mode) ||
-      (info.st_uid == 0 && (info.st_mode & 07777U) == 0644U)) {
+      (info.st_uid == 0 && (info.st_mode & 07777U) == 0644U) || ReadWholeFile(path.c_str(), content) != 0 ||
+      !MayReplace(content)) {
     return 0;
   }
   return RemoveFile(path.c_str());
@@ -94,7 +99,7 @@ int Set(const VORNScheduleRecord &record) {
   }
   return ChangeFile(path.c_str(), [&content](const std::string &old, std::string &fresh) {
     fresh = *content;
-    return old.empty() || IsOurs(old) ? 0 : SetError(QARDC_ERR_ACCESS);
+    return MayReplace(old) ? 0 : SetError(QARDC_ERR_ACCESS);
   });
 }
 
@@ -104,7 +109,7 @@ int Remove(const std::string &command) {
   if (ReadWholeFile(path.c_str(), content) != 0) {
     return QARDCErrGet() == QARDC_ERR_NOT_FOUND ? 0 : -1;
   }
-  return IsOurs(content) ? RemoveFile(path.c_str()) : SetError(QARDC_ERR_ACCESS);
+  return MayReplace(content) ? RemoveFile(path.c_str()) : SetError(QARDC_ERR_ACCESS);
 }
 
 } // namespace
@@ -132,7 +137,7 @@ std::optional<std::string> RenderTask(const VORNScheduleRecord &record) {
   }
   std::string content = kHeader;
   content.append("0 ").append(HoursOf(record)).append(" * * ").append(DaysOf(record.weekdays));
-  return content.append(" root ").append(command).append("\n");
+  return content.append(" root ").append(kRunner).append(command).append("\n");
 }
 
 } // namespace vornhost

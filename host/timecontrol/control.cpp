@@ -157,7 +157,7 @@ int ShowTimeControl(std::ostream &out) {
   const int slot = PresentSlot();
   out << "Time control is on. " << (slot < 0 ? "The clock was never set: nothing is cut." : "It is " + SlotText(slot))
       << "\n";
-  for (const TimeRule &rule : rules) {
+  for (const TimeRule &rule : JoinRules(rules)) {
     out << rule.mac << "  " << Describe(rule, slot) << "  " << LogText(rule.name) << "\n";
   }
   if (ReadTable() != CutIn(slot, rules)) {

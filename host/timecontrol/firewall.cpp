@@ -9,7 +9,7 @@ namespace {
 
 constexpr char kTable[] = "inet vorn_timecontrol";
 
-constexpr char kAddressSet[] = " flags dynamic,timeout; timeout 10m; size 8192;";
+constexpr char kAddressSet[] = " flags dynamic,timeout; timeout 8d; size 8192;";
 
 // Both chains stand before those of others: learn before connection tracking, forward before the base firewall.
 constexpr char kChains[] = R"(
@@ -27,6 +27,8 @@ constexpr char kChains[] = R"(
     ip6 daddr @cut6 drop
   }
 )";
+
+constexpr size_t kRules = 7; // in both chains
 
 // Adding first makes deleting right whether there was a table or not.
 std::string RenderRemoval() {
@@ -64,19 +66,21 @@ int LoadTable(const MacSet &cut) {
 
 std::optional<MacSet> ReadTable() {
   Json::Value items;
-  if (!Nftables().List(std::string("set ") + kTable + " cut", items)) {
+  if (!Nftables().List(std::string("table ") + kTable, items)) {
     return {};
   }
+  size_t rules = 0;
   std::optional<MacSet> cut;
   for (const Json::Value &item : items) {
-    if (item.isMember("set")) {
+    rules += item.isMember("rule") ? 1 : 0;
+    if (item["set"]["name"] == "cut") {
       cut.emplace();
       for (const Json::Value &element : item["set"]["elem"]) {
-        cut->insert(element.asString());
+        cut->insert(element.isString() ? element.asString() : "not loaded by this program");
       }
     }
   }
-  return cut;
+  return rules == kRules ? cut : std::nullopt;
 }
 
 int RemoveTable() {

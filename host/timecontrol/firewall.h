@@ -3,7 +3,8 @@
 //   set cut           the devices that are cut now, by MAC address; what the rules say, and what Read gives back
 //   set cut4, cut6    the addresses that these devices have: those of the kernel's neighbour table when the table is
 //                     loaded, and those that are seen in their packets. A packet on its way to a device does not show
-//                     its MAC address yet where it is forwarded, so that this direction is cut by address.
+//                     its MAC address yet where it is forwarded, so that this direction is cut by address. An address
+//                     stays for longer than a week's schedule can cut without the table being loaded anew.
 //   chain learn       keeps cut4 and cut6. An address counts when it is routed back to where the packet came from, so
 //                     that a device cannot have a server cut for everybody; another device that uses it takes it out.
 //   chain forward     drops what the cut devices send beyond the router and what is sent to them. It comes before the
@@ -30,7 +31,7 @@ std::string RenderTable(const MacSet &cut, const std::vector<std::string> &addre
 /// @retval <0  with the cause in the log; the table is as it was
 int LoadTable(const MacSet &cut);
 
-/// @return the devices that the kernel cuts; nothing when the table is not there
+/// @return the devices that the kernel cuts; nothing when the table, or a rule of it, is not there
 std::optional<MacSet> ReadTable();
 
 /// @retval 0   there is no table any more

@@ -1,13 +1,14 @@
 #include "host/timecontrol/restore.h"
 
 #include "host/utility/atomic_file.h"
-#include "host/utility/line_file.h"
 #include "host/utility/log.h"
 #include "host/utility/program_runner.h"
 #include "platform/schedule.h"
 #include "platform/utility.h"
 
 #include <cstdio>
+#include <cstring>
+#include <memory>
 
 namespace vornhost {
 
@@ -18,14 +19,15 @@ constexpr char kEnforcedRules[] = "/etc/parental/timectrl.conf";
 constexpr char kEnforcedCopy[] = "/tmp/timectrl.conf";
 constexpr char kProgram[] = "/usr/vorn/sbin/vorntimecontrol";
 constexpr char kProgramCopy[] = "/tmp/vorntimecontrol";
+constexpr size_t kRoom = 1024;
 constexpr char kCommand[] = "/tmp/vorntimecontrol --schedule";
 
-int Write(const char *path, const std::string &content) {
-  return ChangeFile(path, [&content](const std::string &, std::string &fresh) {
-    fresh = content;
-    return 0;
-  });
-}
+struct HashFree {
+  void operator()(QARDCSzHash *hash) const { QARDCSzHashFree(hash); }
+};
+struct ListFree {
+  void operator()(QARDCSzList *list) const { QARDCSzListFree(list); }
+};
 
 int ScheduleEveryHour() {
   VORNScheduleRecord record{};
@@ -43,10 +45,34 @@ int Check(int result, const char *what) {
   return result;
 }
 
-int MakeFiles(const std::string &enforced) {
-  if (Check(Write(kEnforcedRules, enforced), kEnforcedRules) < 0 ||
-      Check(Write(kEnforcedCopy, enforced), kEnforcedCopy) < 0 ||
-      Check(ProgramRunner().Run({"/bin/cp", "-f", kProgram, kProgramCopy}), kProgramCopy) < 0) {
+// The rules that are on, exactly as a set over the web API makes them: of two sections with one name the first is read
+// twice, and a key that a section lacks keeps the value of the section before.
+int MakeRules() {
+  const std::unique_ptr<QARDCSzList, ListFree> sections(QARDCSzListAlloc(kRoom));
+  const std::unique_ptr<QARDCSzHash, HashFree> pairs(QARDCSzHashAlloc(kRoom));
+  if (!sections || !pairs) {
+    return -1;
+  }
+  const int count = QARDCFileExist(kUserRules) == 1 ? QARDCFileEnumSection(kUserRules, sections.get()) : 0;
+  for (int i = 0; i < count; ++i) {
+    const char *section = QARDCSzListGet(sections.get(), i);
+    if (QARDCFileGetSection(kUserRules, section, pairs.get()) <= 0) {
+      LogError("time control: rule [%s] cannot be read, it is left out", LogText(section).c_str());
+      continue;
+    }
+    const char *enabled = QARDCSzHashRemoveKey(pairs.get(), "tcenable");
+    if (enabled != nullptr && std::strcmp(enabled, "yes") == 0 &&
+        QARDCFileAddSection(kEnforcedRules, section, pairs.get(), "\t%s=%s\n") < 0) {
+      return -1;
+    }
+  }
+  return count;
+}
+
+int StartFiles() {
+  const ProgramRunner runner;
+  if (Check(runner.Run({"/bin/cp", "-f", kEnforcedRules, kEnforcedCopy}), kEnforcedCopy) < 0 ||
+      Check(runner.Run({"/bin/cp", "-f", kProgram, kProgramCopy}), kProgramCopy) < 0) {
     return -1;
   }
   return Check(ScheduleEveryHour(), kCommand);
@@ -62,39 +88,15 @@ int RemoveFiles() {
 
 } // namespace
 
-std::string EnabledSections(const std::string &content) {
-  std::string enabled;
-  std::string section;
-  bool isEnabled = false;
-  const auto finish = [&enabled, &section, &isEnabled] {
-    enabled += isEnabled ? section : "";
-    section.clear();
-    isEnabled = false;
-  };
-  LineReader reader(content);
-  for (std::string_view text; reader.Next(text);) {
-    const Line line = ParseLine(text);
-    if (line.kind == Line::Kind::kSection) {
-      finish();
-    }
-    if (line.kind == Line::Kind::kPair && line.key == "tcenable") {
-      isEnabled = line.value == "yes";
-    } else if (line.kind == Line::Kind::kSection || !section.empty()) {
-      section.append(text).append("\n");
-    }
-  }
-  finish();
-  return enabled;
-}
-
 int RestoreFiles(bool &enforce) {
-  std::string content;
-  if (QARDCFileExist(kUserRules) == 1 && Check(ReadWholeFile(kUserRules, content), kUserRules) < 0) {
+  // What lies there is from before the restart, or somebody else's: it must neither be used nor be run by the
+  // scheduler.
+  const int removed = RemoveFiles();
+  if (removed < 0 || Check(MakeRules(), kUserRules) < 0) {
     return -1;
   }
-  const std::string enforced = EnabledSections(content);
-  enforce = !enforced.empty();
-  return enforce ? MakeFiles(enforced) : RemoveFiles();
+  enforce = QARDCFileExist(kEnforcedRules) == 1;
+  return enforce ? StartFiles() : 0;
 }
 
 } // namespace vornhost

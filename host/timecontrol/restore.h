@@ -2,13 +2,7 @@
 #ifndef HOST_TIMECONTROL_RESTORE_H
 #define HOST_TIMECONTROL_RESTORE_H
 
-#include <string>
-
 namespace vornhost {
-
-/// @param[in] content  the user's rules
-/// @return the sections whose "tcenable" is "yes", without that key
-std::string EnabledSections(const std::string &content);
 
 /// Makes the enforcing rules and their copy, the copy of the program and the scheduled task; or removes what there is
 /// of them, when no rule is switched on.

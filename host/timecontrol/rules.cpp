@@ -8,6 +8,7 @@
 
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 
@@ -95,6 +96,23 @@ int ReadRules(std::vector<TimeRule> &rules) {
   }
   rules = ParseRules(content);
   return 0;
+}
+
+std::vector<TimeRule> JoinRules(const std::vector<TimeRule> &rules) {
+  std::vector<TimeRule> joined;
+  for (const TimeRule &rule : rules) {
+    const auto known =
+        std::find_if(joined.begin(), joined.end(), [&rule](const TimeRule &each) { return each.mac == rule.mac; });
+    if (known == joined.end()) {
+      joined.push_back(rule);
+      continue;
+    }
+    known->schedule.resize(std::max(known->schedule.size(), rule.schedule.size()), '0');
+    for (size_t slot = 0; slot < rule.schedule.size(); ++slot) {
+      known->schedule[slot] = rule.schedule[slot] == '1' ? '1' : known->schedule[slot];
+    }
+  }
+  return joined;
 }
 
 MacSet CutIn(int slot, const std::vector<TimeRule> &rules) {

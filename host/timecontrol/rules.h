@@ -36,6 +36,9 @@ std::vector<TimeRule> ParseRules(const std::string &content);
 /// @retval <0  with the cause in the log
 int ReadRules(std::vector<TimeRule> &rules);
 
+/// One rule a device, in the order of the first of each, with the hours of all of them.
+std::vector<TimeRule> JoinRules(const std::vector<TimeRule> &rules);
+
 /// The devices that are cut in that slot. Of several rules for one device each counts.
 MacSet CutIn(int slot, const std::vector<TimeRule> &rules);
 

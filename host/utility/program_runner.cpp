@@ -48,19 +48,6 @@ bool IsTrusted(const std::string &path) {
   }
 }
 
-// @param[out] path  the program without symbolic links
-int FindProgram(const std::string &program, std::string &path) {
-  if (program.empty() || program.front() != '/') {
-    return SetError(QARDC_ERR_BAD_ARGUMENT);
-  }
-  std::array<char, PATH_MAX> resolved{};
-  if (realpath(program.c_str(), resolved.data()) == nullptr) {
-    return SetErrno(errno);
-  }
-  path = resolved.data();
-  return IsTrusted(path) ? 0 : SetError(QARDC_ERR_ACCESS);
-}
-
 std::vector<std::string> Environment() {
   std::vector<std::string> out = {"PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin", "LANG=C"};
   if (const char *zone = std::getenv("TZ"); zone != nullptr) {
@@ -234,6 +221,18 @@ int Judge(const std::string &program, int status, int *exitStatus) {
 }
 
 } // namespace
+
+int FindProgram(const std::string &program, std::string &path) {
+  if (program.empty() || program.front() != '/') {
+    return SetError(QARDC_ERR_BAD_ARGUMENT);
+  }
+  std::array<char, PATH_MAX> resolved{};
+  if (realpath(program.c_str(), resolved.data()) == nullptr) {
+    return SetErrno(errno);
+  }
+  path = resolved.data();
+  return IsTrusted(path) ? 0 : SetError(QARDC_ERR_ACCESS);
+}
 
 int ProgramRunner::Run(const std::vector<std::string> &arguments, int *status) const {
   if (status != nullptr) {

@@ -38,6 +38,13 @@ private:
   RunLimits limits_;
 };
 
+/// Finds a program that only root can choose.
+/// @param[in]  program  an absolute path
+/// @param[out] path     the program without symbolic links
+/// @retval 0   done
+/// @retval <0  with the error set
+int FindProgram(const std::string &program, std::string &path);
+
 /// The words of a text, taken apart at blanks.
 std::vector<std::string> SplitWords(const std::string &text);
 

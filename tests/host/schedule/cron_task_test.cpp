@@ -34,7 +34,7 @@ VORNScheduleRecord Hourly(const std::string &command = kCommand) {
 }
 
 std::string Line(const std::string &command) {
-  return std::string(kHeader) + "0 * * * * root " + command + "\n";
+  return std::string(kHeader) + "0 * * * * root /usr/vorn/sbin/vornrun " + command + "\n";
 }
 
 class CronTask : public testing::Test {
@@ -65,7 +65,7 @@ TEST_F(CronTask, Set_ReplacesTheTaskOfTheSameCommandOnly) {
   ASSERT_GE(Set(evening), 0);
   EXPECT_EQ(NamesIn(kFolder).size(), 2U);
   EXPECT_EQ(ReadText(CronFileOf(kCommand)),
-            kHeader + std::string("0 20-23/2 * * 1,5 root /tmp/vorntimecontrol --schedule\n"));
+            kHeader + std::string("0 20-23/2 * * 1,5 root /usr/vorn/sbin/vornrun /tmp/vorntimecontrol --schedule\n"));
   EXPECT_EQ(ReadText(CronFileOf("/tmp/vorntimecontrol --apply")), Line("/tmp/vorntimecontrol --apply"));
 }
 
@@ -134,14 +134,14 @@ TEST_F(CronTask, Set_CommandThatCronOrItsShellWouldChangeIsRefused) {
                                                              "/tmp/x *",
                                                              "/tmp/x ~",
                                                              "/tmp/\xc3\xa4",
-                                                             "/" + std::string(998, 'x'),
+                                                             "/" + std::string(960, 'x'),
                                                              "/" + std::string(1022, 'x'),
                                                              "/" + std::string(1023, 'x')}) {
     EXPECT_LT(Set(Hourly(command)), 0) << command;
     EXPECT_EQ(QARDCErrGet(), QARDC_ERR_BAD_ARGUMENT);
   }
   EXPECT_THAT(NamesIn(kFolder), IsEmpty());
-  EXPECT_GE(Set(Hourly("/" + std::string(997, 'x'))), 0);
+  EXPECT_GE(Set(Hourly("/" + std::string(959, 'x'))), 0);
 }
 
 TEST_F(CronTask, Set_CommandsThatLookAlikeHaveFilesOfTheirOwn) {
@@ -160,9 +160,19 @@ TEST_F(CronTask, Set_AFileThatCronWouldPassOverIsMadeAnew) {
   EXPECT_EQ(ReadText(CronFileOf(kCommand)), Line(kCommand));
 }
 
+TEST_F(CronTask, AnEmptyFileIsTakenAndRemoved) {
+  const std::string path = CronFileOf(kCommand);
+  WriteText(path, "");
+  EXPECT_GE(Set(Hourly()), 0);
+  WriteText(path, "");
+  EXPECT_GE(VORNScheduleRemove(kCommand), 0);
+  EXPECT_NE(access(path.c_str(), F_OK), 0);
+}
+
 TEST_F(CronTask, AnothersFileOfThatNameIsNotTouched) {
   const std::string path = CronFileOf(kCommand);
   WriteText(path, "# mine\n");
+  ASSERT_EQ(chmod(path.c_str(), 0600), 0); // as cron would pass it over
   EXPECT_LT(Set(Hourly()), 0);
   EXPECT_EQ(QARDCErrGet(), QARDC_ERR_ACCESS);
   EXPECT_LT(VORNScheduleRemove(kCommand), 0);

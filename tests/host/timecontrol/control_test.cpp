@@ -194,6 +194,18 @@ TEST_F(TimeControl, Schedule_PutsBackATableThatSomebodyFlushed) {
   EXPECT_THAT(ReadTable(), Optional(Eq(MacSet{kLaptop})));
 }
 
+TEST_F(TimeControl, Schedule_PutsBackARuleThatSomebodyTookOut) {
+  WriteText(kRules, Rule(kLaptop, '1'));
+  ASSERT_EQ(vornhost::ApplyTimeControl(), 0);
+  for (const char *damage : {"flush chain inet vorn_timecontrol forward", "flush chain inet vorn_timecontrol learn",
+                             "add element inet vorn_timecontrol cut '{ 3c:2a:f4:11:22:44 comment \"mine\" }'"}) {
+    ASSERT_EQ(Output(std::string("/usr/sbin/nft ") + damage), "") << damage;
+    EXPECT_THAT(ReadTable(), Not(Optional(Eq(MacSet{kLaptop})))) << damage;
+    ASSERT_EQ(vornhost::ScheduleTimeControl(), 0);
+    EXPECT_THAT(ReadTable(), Optional(Eq(MacSet{kLaptop}))) << damage;
+  }
+}
+
 TEST_F(TimeControl, Schedule_ThatComesAfterTheEndCutsNobody) {
   WriteText(kRules, Rule(kLaptop, '1'));
   ASSERT_EQ(vornhost::ScheduleTimeControl(), 0) << "enforcement was never begun";

@@ -88,6 +88,7 @@ protected:
     std::filesystem::copy_file(TIME_CONTROL, kInstalled, replace);
     std::filesystem::copy_file(TIME_CONTROL, kCopy, replace);
     std::filesystem::copy_file(MODULE_TOOL, kTool, replace);
+    std::filesystem::copy_file(RUNNER, "/usr/vorn/sbin/vornrun", replace);
     FreshFolder("/etc/cron.d");
     FreshFolder("/etc/parental");
     RunLine("/usr/sbin/nft flush ruleset");
@@ -204,6 +205,31 @@ TEST_F(TimeProgram, RestoreEnforcesTheStoredRules) {
   EXPECT_EQ(RunLine(kCommand), 0);
 }
 
+// As a set over the web API makes them: the same after a restart as before it.
+TEST_F(TimeProgram, RestoreReadsRepeatedAndIncompleteSectionsAsASetDoes) {
+  const std::string day(168, '1');
+  WriteText("/etc/parental/timectrl.ui.conf", Section(kLaptop, "\ttcenable=yes\n\tname=A\n\ttc_sched=" + day + "\n") +
+                                                  Section(kLaptop, "\ttcenable=no\n\tname=B\n\ttc_sched=0\n") +
+                                                  Section("3c:2a:f4:11:22:44", "\ttcenable=yes\n\tname=C\n"));
+  ASSERT_EQ(RunLine(std::string(kInstalled) + " --restore"), 0) << ReadText("/tmp/output");
+  const std::string laptop = Section(kLaptop, "\tname=A\n\ttc_sched=" + day + "\n");
+  EXPECT_EQ(ReadText("/etc/parental/timectrl.conf"),
+            laptop + laptop + Section("3c:2a:f4:11:22:44", "\tname=C\n\ttc_sched=" + day + "\n"));
+}
+
+TEST_F(TimeProgram, RestoreUsesNothingThatSomebodyElseHasPutInTheWay) {
+  WriteText("/etc/parental/timectrl.ui.conf",
+            Section(kLaptop, "\ttcenable=yes\n\tname=A\n\ttc_sched=" + std::string(168, '1') + "\n"));
+  for (const char *path : {"/tmp/timectrl.conf", kCopy}) {
+    unlink(path);
+    WriteText(path, "theirs\n");
+    ASSERT_EQ(chmod(path, 0666), 0);
+  }
+  ASSERT_EQ(RunLine(std::string(kInstalled) + " --restore"), 0) << ReadText("/tmp/output");
+  EXPECT_EQ(ReadText(kCopy), ReadText(kInstalled));
+  EXPECT_THAT(ReadTable(), Optional(Eq(MacSet{kLaptop})));
+}
+
 TEST_F(TimeProgram, RestoreWithoutARuleThatIsOnLeavesNothing) {
   Begin(std::string(168, '1'));
   WriteText("/etc/parental/timectrl.ui.conf", Section(kLaptop, "\ttcenable=no\n\tname=n\n\ttc_sched=1\n"));
@@ -216,6 +242,17 @@ TEST_F(TimeProgram, RestoreWithoutARuleThatIsOnLeavesNothing) {
   EXPECT_THAT(NamesIn("/etc/parental"), ElementsAre("timectrl.ui.conf"));
   EXPECT_EQ(access("/tmp/timectrl.conf", F_OK), -1);
   EXPECT_EQ(access(kCopy, F_OK), -1);
+}
+
+TEST_F(TimeProgram, TheSchedulersRunnerRunsOnlyWhatIsRootsAlone) {
+  const std::string run = "/usr/vorn/sbin/vornrun ";
+  EXPECT_EQ(RunLine(run + kCommand), 0);
+  EXPECT_EQ(RunLine(run + "/bin/false"), 1);
+  ASSERT_EQ(chmod(kCopy, 0777), 0);
+  EXPECT_EQ(RunLine(run + kCommand), 126);
+  ASSERT_EQ(unlink(kCopy), 0);
+  EXPECT_EQ(RunLine(run + kCommand), 126);
+  EXPECT_EQ(RunLine(run), 126);
 }
 
 // Cron itself, with a clock that stands shortly before the full hour.

@@ -1,6 +1,5 @@
 #include "host/schedule/local_time.h"
 #include "host/timecontrol/firewall.h"
-#include "host/timecontrol/restore.h"
 #include "host/timecontrol/rules.h"
 #include "tests/host/utility/syslog_record.h"
 
@@ -129,15 +128,14 @@ TEST(RenderTable, HoldsTheDevicesAndTheirAddressesAndNoNames) {
   EXPECT_THAT(vornhost::RenderTable({}, {}), testing::Not(HasSubstr("elements")));
 }
 
-TEST(EnabledSections, AreThoseOfTheRulesThatAreOnWithoutTheSwitch) {
-  EXPECT_EQ(vornhost::EnabledSections("[a]\n\ttcenable=yes\n\tname=A\n\ttc_sched=01\n"
-                                      "[b]\n\ttcenable=no\n\tname=B\n\ttc_sched=11\n"
-                                      "[c]\n\tname=C\n\ttc_sched=11\n"
-                                      "[d]\n\tname=D\n\ttcenable=yes\n"),
-            "[a]\n\tname=A\n\ttc_sched=01\n[d]\n\tname=D\n");
-  EXPECT_EQ(vornhost::EnabledSections(""), "");
-  EXPECT_EQ(vornhost::EnabledSections("\ttcenable=yes\n"), "");
-  EXPECT_EQ(vornhost::EnabledSections("[a]\n\ttcenable=yes"), "[a]\n");
+TEST(JoinRules, OneRuleADeviceHasTheHoursOfAll) {
+  const std::vector<vornhost::TimeRule> joined =
+      vornhost::JoinRules({{"a", "first", "010"}, {"b", "other", "1"}, {"a", "second", "0001x"}});
+  ASSERT_EQ(joined.size(), 2U);
+  EXPECT_EQ(joined[0].mac, "a");
+  EXPECT_EQ(joined[0].name, "first");
+  EXPECT_EQ(joined[0].schedule, "01010");
+  EXPECT_EQ(joined[1].schedule, "1");
 }
 
 } // namespace
