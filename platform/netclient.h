@@ -46,15 +46,15 @@ public:
   /// @retval <0   unknown type, or the records cannot be read
   int GetGatewayListData(const Json::Value &request, Json::Value &list);
 
-  /// Stores one gateway record; one that exists for the same type and interface is replaced, and those from its place on
-  /// move back. Of two who store an order at once neither is refused; the last to speak of an interface is right.
+  /// Stores one gateway record; one that exists for the same type and interface is replaced, and those from its place
+  /// on move back. Of two who store an order at once neither is refused; the last to speak of an interface is right.
   /// @param[in] record  object: "type", "priority" (0 = first), "ifname", "gateway", "dns"; the text "NULL" in the last
   ///                    two means: as the interface's own configuration says
   /// @retval >=0  stored
   /// @retval <0   unknown type; no name of an interface that routes may name; a priority that is no number, behind the
-  ///              end of the order, or no place in the longest order (64); a "gateway" or "dns" other than "NULL"; or the
-  ///              records cannot be written. The records are as they were, and as no refresh may follow, the kernel's
-  ///              default routes are made to agree with them. The log says which it was.
+  ///              end of the order, or no place in the longest order (64); a "gateway" or "dns" other than "NULL"; or
+  ///              the records cannot be written. The records are as they were, and as no refresh may follow, the
+  ///              kernel's default routes are made to agree with them. The log says which it was.
   int AddGatewayData(const Json::Value &record);
 
   /// Makes the kernel's default routes agree with the stored records. An interface whose link came back a moment ago is
