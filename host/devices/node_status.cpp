@@ -44,7 +44,7 @@ std::string ParseNodeStatus(std::string_view message, uint16_t id) {
     const std::string_view entry = message.substr(kNames + 1 + i * kEntry, kEntry);
     const uint8_t suffix = ByteAt(entry, kNameLength);
     const uint8_t flags = ByteAt(entry, kNameLength + 1);
-    const std::string name = CleanName(entry.substr(0, kNameLength));
+    std::string name = CleanName(entry.substr(0, kNameLength));
     if ((flags & kGroup) != 0 || (flags & kActive) == 0 || name.empty()) {
       continue;
     }
