@@ -29,8 +29,8 @@ protected:
     Get().adapters = Parse(R"(["wlan0","wlan1","wlan2"])");
     Get().adapterConfigs = {{"wlan0", Parse(R"({"channel":6,"enabled":true,"mac_filter_list":[],
                                               "mac_filter_policy":"disable"})")},
-                             {"wlan1", Parse(R"({"ssid":"five"})")},
-                             {"wlan2", Parse("{}")}};
+                            {"wlan1", Parse(R"({"ssid":"five"})")},
+                            {"wlan2", Parse("{}")}};
   }
 
   static Json::Value Parameters(const char *policy, const char *list) {
