@@ -114,10 +114,13 @@ is_whole() { # in the old topology or in the new one
   esac
 }
 
+# Counts as done when the server is gone. A child of it that has not yet become another program bears its name too, and
+# may have ended by itself before its turn comes.
 kill_server() {
-  local program
-  program=$(at router pidof vornwebd) && at router sh -c "kill -KILL $program" &&
-    eventually 5 not kill -0 "$server_pid" 2>/dev/null
+  local programs
+  programs=$(at router pidof vornwebd) || return
+  at router sh -c "kill -KILL $programs" 2>/dev/null
+  eventually 5 not kill -0 "$server_pid" 2>/dev/null
 }
 
 has_second_lease() { [ -n "$(addresses_of router eth1)" ]; }

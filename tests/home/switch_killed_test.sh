@@ -22,7 +22,7 @@ back_to_router() {
 
 # Waits inside the router, so that the delay counts from the moment at which the lock is there.
 kill_after_lock() { # DELAY
-  at router timeout 20 sh -c 'until [ -e /tmp/topology.lock ]; do :; done; sleep "$0"; kill -KILL "$(pidof vorntopology)"' "$1"
+  at router timeout 20 sh -c 'until [ -e /tmp/topology.lock ]; do :; done; sleep "$0"; kill -KILL $(pidof vorntopology)' "$1"
 }
 
 hits=0
