@@ -20,6 +20,7 @@ BUILD = os.path.abspath(sys.argv[1])
 ROUNDS = int(sys.argv[2]) if len(sys.argv) > 2 else 5
 SECONDS = 2
 CONNECTIONS = (1, 8, 64)
+HEADERS = {}  # of every call: the token
 TOPOLOGY = "/webapi/VORN.Core.Network.Router.Topology/2/get"
 CONSTANT = "/webapi/VORN.Bench.Constant/1/get"
 
@@ -61,13 +62,23 @@ def wait_for(port):
 
 
 def post(port, path):
-    request = urllib.request.Request(f"http://127.0.0.1:{port}{path}", data=b"", method="POST")
+    request = urllib.request.Request(f"http://127.0.0.1:{port}{path}", data=b"", method="POST", headers=HEADERS)
     with urllib.request.urlopen(request, timeout=5) as answer:
         return answer.read()
 
 
+def make_token():
+    os.environ["VORN_BENCH_STATE"] = tempfile.mkdtemp(prefix="vorn_bench_state.")
+    HEADERS["Authorization"] = "Bearer " + subprocess.run(
+        [f"{BUILD}/webapi/vornwebd", "--state", os.environ["VORN_BENCH_STATE"], "--make-token", "bench"],
+        check=True, capture_output=True, text=True).stdout.strip()
+
+
 def start_server(port, module):
-    server = subprocess.Popen([f"{BUILD}/webapi/vornwebd", "--module", module, "--listen", f"127.0.0.1:{port}"])
+    if not HEADERS:
+        make_token()
+    server = subprocess.Popen([f"{BUILD}/webapi/vornwebd", "--module", module, "--state",
+                               os.environ["VORN_BENCH_STATE"], "--listen", f"127.0.0.1:{port}"])
     wait_for(port)
     return server
 
@@ -91,7 +102,8 @@ http {{ access_log off; keepalive_requests 1000000000; default_type application/
 
 def load(port, method, path, connections):
     """One run of wrk: requests per second and p99 in microseconds."""
-    script = f'wrk.method="{method}"\nfunction done(s, l, r)\n io.write(string.format("RESULT %f %d %d\\n",' \
+    fields = "".join(f'wrk.headers["{name}"]="{value}"\n' for name, value in HEADERS.items())
+    script = f'wrk.method="{method}"\n{fields}function done(s, l, r)\n io.write(string.format("RESULT %f %d %d\\n",' \
              " s.requests / (s.duration / 1e6), l:percentile(99), s.errors.status + s.errors.read + s.errors.timeout))\nend\n"
     with tempfile.NamedTemporaryFile("w", suffix=".lua") as lua:
         lua.write(script)

@@ -26,6 +26,13 @@ Answer RefusedAndClosed(unsigned status, std::string_view message) {
   return answer;
 }
 
+/// For browsers: an answer is data, shown by no page and kept nowhere.
+constexpr std::string_view kBrowserFields =
+    "\r\nCache-Control: no-store\r\nX-Content-Type-Options: nosniff\r\n"
+    "Content-Security-Policy: default-src 'none'; frame-ancestors 'none'; base-uri 'none'; form-action 'none'\r\n"
+    "X-Frame-Options: DENY\r\nReferrer-Policy: no-referrer\r\nCross-Origin-Opener-Policy: same-origin\r\n"
+    "Cross-Origin-Resource-Policy: same-origin\r\n";
+
 /// The Date field's value (RFC 9110, section 5.6.7), made once a second and thread.
 std::string_view DateText() {
   thread_local std::time_t made = -1;
@@ -53,6 +60,20 @@ Answer BadRequest(const char *reason) {
 }
 Answer BadBody(const char *reason) {
   return Refused(400, reason);
+}
+Answer NotLoggedIn() {
+  return Refused(401, "not logged in");
+}
+Answer WrongPassword() {
+  return Refused(401, "wrong user name or password");
+}
+Answer Forbidden(const char *reason) {
+  return Refused(403, reason);
+}
+Answer TooManyTries(unsigned retryAfter) {
+  Answer answer = Refused(429, "too many tries");
+  answer.retryAfter = retryAfter;
+  return answer;
 }
 Answer NotFound() {
   return Refused(404, "no such row");
@@ -110,7 +131,7 @@ Answer UnknownVersion() {
 std::string Render(const Answer &answer, bool keepAlive, bool headOnly) {
   const auto reason = boost::beast::http::obsolete_reason(static_cast<boost::beast::http::status>(answer.status));
   std::string out;
-  out.reserve(320 + answer.body.size());
+  out.reserve(704 + answer.body.size());
   out += "HTTP/1.1 ";
   out += std::to_string(answer.status);
   out += ' ';
@@ -119,7 +140,10 @@ std::string Render(const Answer &answer, bool keepAlive, bool headOnly) {
   out += DateText();
   out += "\r\nContent-Type: application/json\r\nContent-Length: ";
   out += std::to_string(answer.body.size());
-  out += "\r\nCache-Control: no-store\r\nX-Content-Type-Options: nosniff\r\n";
+  out += kBrowserFields;
+  if (!answer.cookie.empty()) {
+    out.append("Set-Cookie: ").append(answer.cookie).append("\r\n");
+  }
   if (answer.allow != nullptr) {
     out.append("Allow: ").append(answer.allow).append("\r\n");
   }

@@ -11,6 +11,7 @@ struct Answer {
   std::string body;
   bool close = false; ///< the connection cannot be used after it
   const char *allow = nullptr;
+  std::string cookie;      ///< the value of Set-Cookie; empty: none
   unsigned retryAfter = 0; ///< seconds; 0: not said
 };
 
@@ -21,6 +22,10 @@ Answer Answered(std::string body);
 // static text without characters that JSON escapes; no input is ever repeated in it.
 Answer BadRequest(const char *reason); ///< malformed HTTP: closes
 Answer BadBody(const char *reason);
+Answer NotLoggedIn();
+Answer WrongPassword();
+Answer Forbidden(const char *reason);
+Answer TooManyTries(unsigned retryAfter);
 Answer NotFound();
 Answer MethodNotAllowed();
 Answer RequestTimeout();

@@ -7,7 +7,6 @@
 #include <charconv>
 #include <filesystem>
 #include <fstream>
-#include <limits>
 #include <string_view>
 #include <variant>
 #include <vector>
@@ -29,10 +28,13 @@ struct Key {
 
 constexpr size_t kDay = 86'400'000;
 
-constexpr std::array<Key, 23> kKeys = {{
-    {"listen", &Config::listen, 0, 0, "loopback address and port; port 0: any free one; [::1]:8080 for IPv6"},
+constexpr std::array<Key, 35> kKeys = {{
+    {"listen", &Config::listen, 0, 0, "address and port; port 0: any free one; [::1]:8080 for IPv6"},
     {"module", &Config::module, 0, 0, "the shared library to serve"},
     {"host-names", &Config::hostNames, 0, 0, "names, beside localhost, that a request may have in Host"},
+    {"state", &Config::state, 0, 0, "folder of the password, the tokens and the certificate"},
+    {"tls", &Config::tls, 0, 0, "yes: HTTPS, with a certificate that is made at the first start"},
+    {"plain-http", &Config::plainHttp, 0, 0, "yes: HTTP without TLS may be served beyond loopback"},
     {"log-stderr", &Config::logToStandardError, 0, 0, "yes: log to the standard error stream too"},
     {"slots", &Config::slots, 1, 256, "calls in the module at once"},
     {"queue", &Config::queue, 0, 10'000, "calls that may wait for a slot; further ones get 503"},
@@ -42,8 +44,16 @@ constexpr std::array<Key, 23> kKeys = {{
     {"header-bytes", &Config::headerBytes, 64, 65'536, "longest header after the request line, else 431"},
     {"header-fields", &Config::headerFields, 1, 1'000, "most header fields, else 431"},
     {"body-bytes", &Config::bodyBytes, 0, 16'777'216, "longest body, else 413"},
+    {"login-body-bytes", &Config::loginBodyBytes, 256, 65'536, "longest body of a login and its like, else 413"},
+    {"login-failures", &Config::loginFailures, 1, 1'000, "wrong passwords until each try has to wait, with 429"},
+    {"login-delay", &Config::loginDelay, 10, kDay, "that wait"},
+    {"login-queue", &Config::loginQueue, 0, 100, "logins that may wait for the one at work; further ones get 429"},
+    {"sessions", &Config::sessions, 1, 10'000, "people logged in; then the longest silent one gives way"},
+    {"session-idle-time", &Config::sessionIdleTime, 10, kDay, "a session ends after this without a call but polling"},
+    {"session-time", &Config::sessionTime, 10, kDay, "a session ends after this"},
     {"json-depth", &Config::jsonDepth, 1, 64, "deepest nesting of parameters, else 400"},
     {"json-values", &Config::jsonValues, 1, 10'000'000, "most values in all parameters together, else 400"},
+    {"handshake-time", &Config::handshakeTime, 10, kDay, "a new TLS connection must have begun to speak within this"},
     {"header-time", &Config::headerTime, 10, kDay, "from a request's first byte to the end of its header, else 408"},
     {"body-time", &Config::bodyTime, 10, kDay, "from there to the end of its body, else 408"},
     {"idle-time", &Config::idleTime, 10, kDay, "an open connection without a request is closed after this"},
@@ -52,12 +62,13 @@ constexpr std::array<Key, 23> kKeys = {{
     {"tasks", &Config::tasks, 1, 256, "poll tasks in all"},
     {"task-keep-time", &Config::taskKeepTime, 10, kDay, "a finished task nobody asks for is dropped after this"},
     // Names that the command line alone knows.
+    {"make-token", &Config::makeToken, 0, 0, "a name: makes a full token of 3650 days for root, prints it and ends"},
     {"config", Member{}, 0, 0, "this file"},
     {"help", Member{}, 0, 0, "prints this"},
 }};
 
 bool OfCommandLineOnly(const Key &key) {
-  return key.name == "config" || key.name == "help";
+  return key.name == "config" || key.name == "help" || key.name == "make-token";
 }
 
 /// The whole of `text` as a number.
@@ -110,9 +121,9 @@ std::string Set(const Key &key, std::string_view text, Config &config) {
   return {};
 }
 
-std::string SetByName(std::string_view name, std::string_view text, Config &config) {
+std::string SetByName(std::string_view name, std::string_view text, bool inFile, Config &config) {
   const auto *key = std::find_if(kKeys.begin(), kKeys.end(), [name](const Key &each) { return each.name == name; });
-  if (key == kKeys.end() || OfCommandLineOnly(*key)) {
+  if (key == kKeys.end() || (inFile && OfCommandLineOnly(*key))) {
     return "unknown key \"" + std::string(name) + "\"";
   }
   const std::string fault = Set(*key, text, config);
@@ -131,9 +142,9 @@ std::string ReadFile(const std::string &path, Config &config) {
       continue;
     }
     const size_t equals = text.find('=');
-    const std::string fault = equals == std::string_view::npos
-                                  ? "no key=value line"
-                                  : SetByName(Trim(text.substr(0, equals)), Trim(text.substr(equals + 1)), config);
+    const std::string fault = equals == std::string_view::npos ? "no key=value line"
+                                                               : SetByName(Trim(text.substr(0, equals)),
+                                                                           Trim(text.substr(equals + 1)), true, config);
     if (!fault.empty()) {
       return std::string(path).append(":").append(std::to_string(number)).append(": ").append(fault);
     }
@@ -199,10 +210,10 @@ Start ReadConfig(int argc, const char *const *argv, Config &config, std::string 
   }
   for (const Option &option : options) {
     if (fault.empty() && option.name != "config") {
-      fault = SetByName(option.name, option.value, config);
+      fault = SetByName(option.name, option.value, false, config);
     }
   }
-  if (fault.empty() && config.module.empty()) {
+  if (fault.empty() && config.module.empty() && config.makeToken.empty()) {
     fault = "no module to serve: --module PATH";
   }
   return fault.empty() ? Start::kServe : Start::kRefused;

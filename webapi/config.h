@@ -15,6 +15,9 @@ struct Config {
   std::string listen = "127.0.0.1:8080";
   std::string module;
   std::string hostNames; ///< blank-separated
+  std::string state = "/var/lib/vorn";
+  bool tls = false;
+  bool plainHttp = false;
   bool logToStandardError = false;
 
   size_t slots = 16;
@@ -29,6 +32,16 @@ struct Config {
   size_t jsonDepth = 64;
   size_t jsonValues = 50000;
 
+  size_t loginBodyBytes = 4096;
+  size_t loginFailures = 10;
+  size_t loginQueue = 8;
+  size_t sessions = 32;
+  Milliseconds loginDelay{60'000};
+  Milliseconds sessionIdleTime{600'000};
+  Milliseconds sessionTime{86'400'000};
+  std::string makeToken; ///< its name: not served, the token is made
+
+  Milliseconds handshakeTime{15'000};
   Milliseconds headerTime{10'000};
   Milliseconds bodyTime{15'000};
   Milliseconds idleTime{15'000};

@@ -25,9 +25,9 @@ std::array<char, kReadAtOnce> &Scratch() {
 } // namespace
 
 Connection::Connection(Shared &shared, Socket socket, const ClientKey &client, HostRule hosts, Peer peer)
-    : shared_(shared), transport_(std::move(socket)), client_(client),
+    : shared_(shared), transport_(std::move(socket), shared.tls), client_(client),
       session_(shared.service, std::move(hosts), std::move(peer)) {
-  Enter(Phase::kIdle, shared_.config.idleTime);
+  Enter(Phase::kIdle, shared_.tls != nullptr ? shared_.config.handshakeTime : shared_.config.idleTime);
   shared_.connections.Add(*this); // from here on it may be swept
 }
 

@@ -18,6 +18,7 @@ namespace vornwebapi {
 /// What all connections share; outlives them.
 struct Shared {
   const Config &config;
+  SSL_CTX *tls; ///< null: plain HTTP
   Service &service;
   Gate &gate;
   Runners &runners;

@@ -81,9 +81,10 @@ std::string AddressText(const ip::address &address) {
   return mapped ? ip::make_address_v4(ip::v4_mapped, address.to_v6()).to_string() : address.to_string();
 }
 
+/// Over TLS there is no answer before the handshake: nothing is sent.
 /// As much of a short answer as the kernel takes at once; then the connection is closed.
-void TurnAway(int descriptor, const Answer &answer) {
-  const std::string text = Render(answer, false, false);
+void TurnAway(int descriptor, bool secure, const Answer &answer) {
+  const std::string text = secure ? "" : Render(answer, false, false);
   [[maybe_unused]] const ssize_t sent = send(descriptor, text.data(), text.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
   close(descriptor);
 }
@@ -121,7 +122,16 @@ bool Listener::TakeInherited(int descriptor, std::string &fault) {
     acceptor_.non_blocking(true, refused);
   }
   fault = refused.message();
-  return !refused;
+  return !refused && MayServe(acceptor_.local_endpoint(refused).address(), fault);
+}
+
+// Passwords and cookies in clear are for this machine's own eyes, unless someone asks for it.
+bool Listener::MayServe(const ip::address &address, std::string &fault) const {
+  if (address.is_loopback() || shared_.tls != nullptr || shared_.config.plainHttp) {
+    return true;
+  }
+  fault = "listen: " + address.to_string() + " is no loopback address: it needs tls, or plain-http";
+  return false;
 }
 
 bool Listener::Bind(std::string &fault) {
@@ -130,8 +140,7 @@ bool Listener::Bind(std::string &fault) {
     fault = "listen: \"" + shared_.config.listen + "\" is no address and port such as 127.0.0.1:8080";
     return false;
   }
-  if (!endpoint->address().is_loopback()) {
-    fault = "listen: " + shared_.config.listen + " is no loopback address, and there is no login to protect it";
+  if (!MayServe(endpoint->address(), fault)) {
     return false;
   }
   const int descriptor = socket(endpoint->protocol().family(), SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
@@ -226,13 +235,14 @@ void Listener::Welcome(int descriptor) {
   if (admission != Connections::Admission::kAdmitted) {
     Log(LogKind::kConnectionLimit, "%s: %s", AddressText(client.address()).c_str(),
         admission == Connections::Admission::kTooMany ? "too many connections" : "too many connections of this client");
-    TurnAway(socket.release(), TooManyConnections());
+    TurnAway(socket.release(), shared_.tls != nullptr, TooManyConnections());
     return;
   }
   std::shared_ptr<Connection> connection;
   try {
     const HostRule hosts{&shared_.service.HostNames(), AddressText(own.address())};
-    connection = std::make_shared<Connection>(shared_, std::move(socket), key, hosts, Peer{own.port()});
+    connection = std::make_shared<Connection>(shared_, std::move(socket), key, hosts,
+                                              Peer{own.port(), shared_.tls != nullptr, AddressText(client.address())});
   } catch (const std::bad_alloc &) {
     Log(LogKind::kDescriptorLimit, "no connection can be accepted: no memory");
     shared_.connections.Release(key);

@@ -28,6 +28,7 @@ public:
 private:
   bool TakeInherited(int descriptor, std::string &fault);
   bool Bind(std::string &fault);
+  bool MayServe(const boost::asio::ip::address &address, std::string &fault) const;
   void WaitForClient();
   void AcceptAll();
   void Welcome(int descriptor);

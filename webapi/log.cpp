@@ -29,7 +29,11 @@ constexpr std::array<Kind, kKinds> kKindTable = {{{LOG_INFO, "lifecycle"},
                                                   {LOG_WARNING, "slow client"},
                                                   {LOG_WARNING, "refused request"},
                                                   {LOG_WARNING, "busy"},
-                                                  {LOG_WARNING, "task limit"}}};
+                                                  {LOG_WARNING, "task limit"},
+                                                  {LOG_NOTICE, "login"},
+                                                  {LOG_WARNING, "refused login"},
+                                                  {LOG_WARNING, "login limit"},
+                                                  {LOG_NOTICE, "change"}}};
 
 /// One kind's allowance in the running window.
 struct Allowance {

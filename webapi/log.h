@@ -21,6 +21,10 @@ enum class LogKind {
   kRefusedRequest,  ///< too long, too deep, malformed
   kBusy,            ///< every slot and waiting place taken
   kTaskLimit,       ///< a poll task was refused
+  kLogin,           ///< someone logged in
+  kRefusedLogin,    ///< with a wrong user or password
+  kLoginLimit,      ///< too many tries
+  kChange,          ///< a call that may change something: who, from where, what, and what came of it
   kCount
 };
 

@@ -2,6 +2,7 @@
 #include "webapi/log.h"
 #include "webapi/module.h"
 #include "webapi/server.h"
+#include "webapi/tls.h"
 
 #include <malloc.h>
 #include <sys/eventfd.h>
@@ -57,6 +58,47 @@ int Refuse(const std::string &fault) {
   return EXIT_FAILURE;
 }
 
+/// The state, and what is shown of it: a new administrator's password to the console, once, and the certificate's
+/// fingerprint.
+bool OpenState(const vornwebapi::Config &config, vornwebapi::Access &access, vornwebapi::TlsContext &tls,
+               std::string &fault) {
+  std::string password;
+  if (!access.Open(password, fault)) {
+    return false;
+  }
+  if (!password.empty()) {
+    std::printf("The administrator is \"%s\", the first password is \"%s\" (also in %s).\n", vornwebapi::kAdministrator,
+                password.c_str(), access.State().Path("first-password").c_str());
+  }
+  std::string fingerprint;
+  if (config.tls) {
+    tls = vornwebapi::OpenTls(access.State(), config.hostNames, fingerprint, fault);
+    std::printf("SHA-256 fingerprint of the certificate: %s\n", fingerprint.c_str());
+    vornwebapi::Log(vornwebapi::LogKind::kLifecycle, "the certificate is %s", fingerprint.c_str());
+  }
+  std::fflush(stdout);
+  return !config.tls || tls != nullptr;
+}
+
+/// For root, who can read all of the state anyway: programs of this machine get in without a person.
+int MakeToken(const vornwebapi::Config &config) {
+  constexpr std::int64_t kTenYears = 3650L * 86'400; // seconds
+  vornwebapi::Access access(config);
+  std::string fault;
+  std::string id;
+  std::string text;
+  std::string password; // of a new administrator: it stays in its file
+  if (!access.Open(password, fault)) {
+    return Refuse(fault);
+  }
+  if (!vornwebapi::Tokens::GoodName(config.makeToken) ||
+      access.TheTokens().Make(config.makeToken, true, kTenYears, id, text) != vornwebapi::Tokens::Result::kDone) {
+    return Refuse("make-token: no such token can be made");
+  }
+  std::printf("%s\n", text.c_str());
+  return EXIT_SUCCESS;
+}
+
 } // namespace
 
 int main(int argc, char **argv) {
@@ -74,11 +116,19 @@ int main(int argc, char **argv) {
   }
   vornwebapi::OpenLog(config.logToStandardError);
   RaiseDescriptorLimit(config);
+  if (!config.makeToken.empty()) {
+    return MakeToken(config);
+  }
   std::vector<VORN::APIEntry> rows;
   if (!SetSignals() || !vornwebapi::LoadModule(config.module, rows, fault)) {
     return Refuse(fault);
   }
-  vornwebapi::Server server(config, rows);
+  vornwebapi::Service service(config, rows);
+  vornwebapi::TlsContext tls;
+  if (!OpenState(config, service.Gate(), tls, fault)) {
+    return Refuse(fault);
+  }
+  vornwebapi::Server server(config, service, tls.get());
   if (!server.Open(fault)) {
     return Refuse(fault);
   }

@@ -57,6 +57,9 @@ bool APIPolling::Status(const std::string &id, Json::Value &data) {
     error_ = vornwebapi::kTaskBadArgument;
     return false;
   }
+  if (caller->polled != nullptr) {
+    *caller->polled = true;
+  }
   const int failed = caller->tasks->Status(caller->user, id, data);
   error_ = failed != 0 ? failed : error_;
   return failed == 0;

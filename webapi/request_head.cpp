@@ -48,6 +48,15 @@ Field Find(const http::request_header<> &header, http::field name) {
   return field;
 }
 
+std::vector<std::string> Values(const http::request_header<> &header, boost::beast::string_view name) {
+  std::vector<std::string> values;
+  const auto [begin, end] = header.equal_range(name);
+  for (auto at = begin; at != end; ++at) {
+    values.emplace_back(Trim(View(at->value())));
+  }
+  return values;
+}
+
 /// Length and transfer coding: exactly one way to tell where a body ends (RFC 9112, section 6.3, the strict readings).
 std::optional<Answer> ReadFraming(const http::request_header<> &header, RequestHead &head) {
   const Field length = Find(header, http::field::content_length);
@@ -199,6 +208,13 @@ std::optional<Answer> ReadHead(const http::request_header<> &header, const HostR
   }
   head.target = View(header.target());
   head.json = SaysJson(header);
+  head.host = Find(header, http::field::host).value;
+  head.origin = Values(header, "Origin");
+  head.fetchSite = Values(header, "Sec-Fetch-Site");
+  head.authorization = Values(header, "Authorization");
+  head.cookies = Values(header, "Cookie");
+  head.csrf = Values(header, "X-CSRF-Token");
+  head.poll = !Values(header, "X-Poll").empty();
   const Field language = Find(header, http::field::accept_language);
   head.language = LanguageCode(language.count == 1 ? language.value : "");
   return std::nullopt;

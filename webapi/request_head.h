@@ -16,7 +16,14 @@ namespace vornwebapi {
 struct RequestHead {
   std::string method;
   std::string target;
-  std::string language; ///< the caller's language code
+  std::string language;               ///< the caller's language code
+  std::string host;                   ///< as it stands; empty: none
+  std::vector<std::string> origin;    ///< these: every value that was sent
+  std::vector<std::string> fetchSite; ///< Sec-Fetch-Site
+  std::vector<std::string> authorization;
+  std::vector<std::string> cookies;
+  std::vector<std::string> csrf; ///< X-CSRF-Token
+  bool poll = false;             ///< X-Poll: the page asks by itself, nobody may be there
   bool keepAlive = true;
   bool hasBody = false;
   bool chunked = false;

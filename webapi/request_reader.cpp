@@ -1,5 +1,6 @@
 #include "webapi/request_reader.h"
 
+#include <algorithm>
 #include <boost/asio/buffer.hpp>
 #include <limits>
 #include <utility>
@@ -112,13 +113,14 @@ void RequestReader::ParseHeader() {
   state_ = State::kHead;
 }
 
-void RequestReader::ReadBody() {
+void RequestReader::ReadBody(size_t most) {
+  bodyBytes_ = std::min(most, limits_.bodyBytes);
   const auto length = parser_->content_length();
-  if (length && *length > limits_.bodyBytes) {
+  if (length && *length > bodyBytes_) {
     Fail(BodyTooLarge());
     return;
   }
-  parser_->body_limit(limits_.bodyBytes);
+  parser_->body_limit(bodyBytes_);
   state_ = parser_->is_done() ? State::kDone : State::kBody;
 }
 
@@ -131,7 +133,7 @@ void RequestReader::AdvanceBody() {
   buffer_.erase(0, used);
   if (fault == http::error::body_limit || fault == http::error::buffer_overflow) {
     Fail(BodyTooLarge());
-  } else if ((fault && fault != http::error::need_more) || buffer_.size() > kMostUnparsedBody + limits_.bodyBytes) {
+  } else if ((fault && fault != http::error::need_more) || buffer_.size() > kMostUnparsedBody + bodyBytes_) {
     Fail(BadRequest("bad body"));
   } else if (parser_->is_done()) {
     state_ = State::kDone;

@@ -39,8 +39,10 @@ public:
   void Feed(std::string_view bytes);
   /// Goes as far as the bytes at hand allow.
   State Advance();
-  void ReadBody(); ///< after kHead
-  void Next();     ///< after kDone: forgets the request; bytes that came behind it are the next one's
+  /// After kHead.
+  /// @param[in] most  bytes of the body, within the limits
+  void ReadBody(size_t most);
+  void Next(); ///< after kDone: forgets the request; bytes that came behind it are the next one's
 
   const RequestHead &Head() const { return head_; }
   const std::string &Body() const { return parser_->get().body(); }
@@ -66,6 +68,7 @@ private:
   size_t headerStart_ = 0; // in buffer_, behind the request line
   size_t lines_ = 0;       // complete ones, the request line among them
   std::unique_ptr<Parser> parser_;
+  size_t bodyBytes_ = 0; // most of the request at hand
   RequestHead head_;
   Answer fault_;
 };

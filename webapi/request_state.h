@@ -20,6 +20,8 @@ struct APIRequest::State {
   std::string language = "enu";
   bool secure = false;
   int serverPort = 0;
+  /// Of a call, gone when its task runs: whether it only asked for a task's status.
+  bool *polled = nullptr;
   vornwebapi::TaskRegistry *tasks = nullptr; ///< outlives the request
 
   static const State &Of(const APIRequest &request) { return *request.state_; }

@@ -24,12 +24,12 @@ Milliseconds SweepTime(const Config &config) {
 
 } // namespace
 
-Server::Server(const Config &config, const std::vector<VORN::APIEntry> &rows)
-    : config_(config), sweepTime_(SweepTime(config)), service_(config, rows),
+Server::Server(const Config &config, Service &service, SSL_CTX *tls)
+    : config_(config), sweepTime_(SweepTime(config)), service_(service),
       connections_(config.connections, config.connectionsPerAddress),
       gate_(config.slots, config.queue,
             [this](std::function<void()> work) { boost::asio::post(context_, std::move(work)); }),
-      runners_(context_, config.slots), shared_{config, service_, gate_, runners_, connections_},
+      runners_(context_, config.slots), shared_{config, tls, service_, gate_, runners_, connections_},
       listener_(context_, shared_) {}
 
 Server::~Server() = default;
@@ -66,6 +66,7 @@ bool Server::Stop() {
   } while (!connections_.WaitForNone(std::min(deadline, Connections::Clock::now() + sweepTime_)) &&
            Connections::Clock::now() < deadline);
   connections_.Abort();
+  service_.Gate().TheTokens().SaveUse();
   const size_t tasks = service_.Tasks().Shutdown(deadline);
   const bool ended = runners_.JoinAll(std::max(deadline, Connections::Clock::now() + kTimeAfterAbort));
   if (!ended || tasks > 0) {

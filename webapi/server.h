@@ -9,14 +9,14 @@
 
 #include <boost/asio/io_context.hpp>
 #include <string>
-#include <vector>
 
 namespace vornwebapi {
 
 class Server {
 public:
-  /// @param[in] config  outlives the server
-  Server(const Config &config, const std::vector<VORN::APIEntry> &rows);
+  /// @param[in] config, service  outlive the server
+  /// @param[in] tls  null: plain HTTP; outlives the server
+  Server(const Config &config, Service &service, SSL_CTX *tls);
   Server(const Server &) = delete;
   Server &operator=(const Server &) = delete;
   ~Server();
@@ -34,7 +34,7 @@ private:
 
   const Config &config_;
   const Milliseconds sweepTime_;
-  Service service_;
+  Service &service_;
   Connections connections_;
   boost::asio::io_context context_;
   Gate gate_;

@@ -3,6 +3,7 @@
 #include "webapi/config.h"
 #include "webapi/handler_response.h"
 #include "webapi/log.h"
+#include "webapi/own_calls.h"
 #include "webapi/parameters.h"
 #include "webapi/text.h"
 
@@ -37,6 +38,16 @@ Answer AnswerOf(const Route &route, HandlerResponse &response) {
   return Answered(response.TakeText());
 }
 
+/// "done", or the code of the failure: nothing else of an answer is logged.
+std::string OutcomeOf(const Answer &answer) {
+  constexpr std::string_view kFailed = R"({"success":false,"error":{"code":)";
+  if (answer.body.compare(0, kFailed.size(), kFailed) != 0) {
+    return "done";
+  }
+  const size_t end = answer.body.find_first_not_of("-0123456789", kFailed.size());
+  return "failed with " + answer.body.substr(kFailed.size(), end - kFailed.size());
+}
+
 /// The configuration's names and localhost, lower case.
 std::vector<std::string> ReadHostNames(const std::string &text) {
   std::istringstream words(Lower(text) + " localhost");
@@ -46,7 +57,8 @@ std::vector<std::string> ReadHostNames(const std::string &text) {
 } // namespace
 
 Service::Service(const Config &config, const std::vector<VORN::APIEntry> &rows)
-    : http_{config.requestLineBytes, config.headerBytes, config.headerFields, config.bodyBytes},
+    : access_(config), loginBodyBytes_(config.loginBodyBytes), http_{config.requestLineBytes, config.headerBytes,
+                                                                     config.headerFields, config.bodyBytes},
       hostNames_(ReadHostNames(config.hostNames)), json_{config.jsonDepth, config.jsonValues},
       tasks_({config.tasks, config.taskKeepTime}) {
   for (const VORN::APIEntry &row : rows) {
@@ -61,26 +73,59 @@ const Route *Service::Find(std::string_view path) const {
   return found == routes_.end() ? nullptr : &found->second;
 }
 
-Outcome Service::Call(const Route &route, const Peer &peer, const RequestHead &head, const std::string &body) {
+Outcome Service::Call(const Route &route, const Caller &caller, const Peer &peer, const RequestHead &head,
+                      const std::string &body) {
   try {
     VORN::APIRequest::State state;
     if (const char *fault = ReadParameters(body, json_, state.parameters)) {
       Log(LogKind::kRefusedRequest, "%s: %s", route.name.c_str(), fault);
       return {BadBody(fault), {}};
     }
-    state.user = peer.user;
+    if (!access_.Stands(caller)) {
+      return {NotLoggedIn(), {}};
+    }
+    bool polled = false;
+    state.user = caller.User();
     state.language = head.language;
     state.secure = peer.secure;
     state.serverPort = peer.serverPort;
+    state.polled = &polled;
     state.tasks = &tasks_;
     HandlerResponse answered;
     VORN::APIRequest request(state);
     VORN::APIResponse response(answered);
     const bool returned = RunHandler(route, request, response);
     Answer answer = returned ? AnswerOf(route, answered) : HandlerFailed();
+    if (!polled && !head.poll) {
+      access_.Touch(caller);
+    }
+    if (!Reads(route.row.method)) {
+      Log(LogKind::kChange, "%s from %s called %s: %s", caller.User().c_str(), peer.from.c_str(), route.name.c_str(),
+          OutcomeOf(answer).c_str());
+    }
     return {std::move(answer), answered.TakeCallbacks()};
   } catch (const std::exception &error) { // no memory
     Log(LogKind::kModuleFault, "%s: %s", route.name.c_str(), Printable(error.what()).c_str());
+    return {HandlerFailed(), {}};
+  }
+}
+
+Outcome Service::CallOwn(const Decision &decision, const Peer &peer, const RequestHead &head, const std::string &body) {
+  try {
+    Json::Value parameters;
+    if (const char *fault = ReadParameters(body, json_, parameters)) {
+      return {BadBody(fault), {}};
+    }
+    const Caller *caller = decision.caller ? &*decision.caller : nullptr;
+    if (caller != nullptr && !access_.Stands(*caller)) {
+      return {NotLoggedIn(), {}};
+    }
+    if (caller != nullptr) {
+      access_.Touch(*caller);
+    }
+    return {RunOwnCall(decision.own, access_, caller, peer, head, parameters), {}};
+  } catch (const std::exception &error) { // no memory
+    Log(LogKind::kModuleFault, "own call: %s", Printable(error.what()).c_str());
     return {HandlerFailed(), {}};
   }
 }

@@ -2,6 +2,7 @@
 #ifndef WEBAPI_SERVICE_H
 #define WEBAPI_SERVICE_H
 
+#include "webapi/access.h"
 #include "webapi/answer.h"
 #include "webapi/callbacks.h"
 #include "webapi/json_scanner.h"
@@ -24,20 +25,14 @@ struct Route {
   std::string name;
 };
 
-/// What is known of a connection's two ends.
-struct Peer {
-  int serverPort = 0;
-  bool secure = false;
-  std::string user = "local"; ///< whom the call is made for
-};
-
 /// What came of a call.
 struct Outcome {
   Answer answer;
   Callbacks callbacks; ///< to be run when the answer was handed to the kernel, or could not be
 };
 
-/// Every member may be called from any thread; nothing changes after construction but the tasks.
+/// Every member may be called from any thread; nothing changes after construction but the tasks and who is
+/// logged in.
 class Service {
 public:
   Service(const Config &config, const std::vector<VORN::APIEntry> &rows);
@@ -45,13 +40,18 @@ public:
   const HttpLimits &Limits() const { return http_; }
   const std::vector<std::string> &HostNames() const { return hostNames_; }
   TaskRegistry &Tasks() { return tasks_; }
+  Access &Gate() { return access_; }
+  size_t LoginBodyBytes() const { return loginBodyBytes_; }
 
   /// @param[in] path  the request's target, compared byte by byte
   /// @return null when there is no such row
   const Route *Find(std::string_view path) const;
 
   /// Runs a row's handler. No exception leaves it.
-  Outcome Call(const Route &route, const Peer &peer, const RequestHead &head, const std::string &body);
+  Outcome Call(const Route &route, const Caller &caller, const Peer &peer, const RequestHead &head,
+               const std::string &body);
+  /// Runs one of the server's own calls. No exception leaves it.
+  Outcome CallOwn(const Decision &decision, const Peer &peer, const RequestHead &head, const std::string &body);
 
 private:
   struct Hash {
@@ -59,6 +59,8 @@ private:
     size_t operator()(std::string_view text) const { return std::hash<std::string_view>()(text); }
   };
 
+  Access access_;
+  size_t loginBodyBytes_;
   HttpLimits http_;
   std::vector<std::string> hostNames_; // lower case
   JsonLimits json_;

@@ -30,8 +30,13 @@ Session::Wants Session::Step() {
 // What the header alone decides is answered before the body is taken.
 Session::Wants Session::Head() {
   const RequestHead &head = reader_.Head();
-  route_ = service_.Find(head.target);
-  if (route_ == nullptr) {
+  decision_ = service_.Gate().Decide(head, peer_);
+  if (decision_.refused) {
+    return Refuse(*decision_.refused);
+  }
+  const bool own = decision_.own != OwnCall::kNone;
+  route_ = own ? nullptr : service_.Find(head.target);
+  if (!own && route_ == nullptr) {
     return Refuse(NotFound());
   }
   if (head.method != "POST") {
@@ -41,7 +46,7 @@ Session::Wants Session::Head() {
     return Refuse(UnsupportedMediaType());
   }
   const bool expects = head.expectsContinue && !reader_.HasBytes();
-  reader_.ReadBody();
+  reader_.ReadBody(own ? service_.LoginBodyBytes() : service_.Limits().bodyBytes);
   return expects && reader_.Advance() == RequestReader::State::kBody ? Wants::kContinue : Step();
 }
 
@@ -51,7 +56,10 @@ Session::Wants Session::Refuse(Answer answer) {
 }
 
 Outcome Session::Call() {
-  return service_.Call(*route_, peer_, reader_.Head(), reader_.Body());
+  if (route_ == nullptr) {
+    return service_.CallOwn(decision_, peer_, reader_.Head(), reader_.Body());
+  }
+  return service_.Call(*route_, *decision_.caller, peer_, reader_.Head(), reader_.Body());
 }
 
 std::string Session::Finish(const Answer &answer, bool stopping, bool &close) {
@@ -62,6 +70,8 @@ std::string Session::Finish(const Answer &answer, bool stopping, bool &close) {
   std::string text = Render(answer, !close, head.method == "HEAD");
   if (!close) {
     reader_.Next();
+    decision_ = {};
+    route_ = nullptr;
     state_ = RequestReader::State::kIdle;
   }
   return text;

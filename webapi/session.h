@@ -47,7 +47,8 @@ private:
   const Peer peer_;
   RequestReader reader_;
   RequestReader::State state_ = RequestReader::State::kIdle;
-  const Route *route_ = nullptr;
+  Decision decision_;            // on the request at hand
+  const Route *route_ = nullptr; // null: one of the server's own calls
   Answer refusal_;
 };
 

@@ -1,12 +1,10 @@
 #include "webapi/task_registry.h"
 
 #include "webapi/log.h"
+#include "webapi/random.h"
 #include "webapi/task_state.h"
 
-#include <sys/random.h>
-
 #include <algorithm>
-#include <array>
 #include <condition_variable>
 #include <exception>
 #include <list>
@@ -28,22 +26,9 @@ struct Task {
   TaskRegistry::Clock::time_point asked; // guarded by the registry's mutex
 };
 
-using TaskPointer = std::shared_ptr<Task>;
+constexpr size_t kIdBytes = 16;
 
-/// @return 128 bits of the kernel's generator as hexadecimal digits; empty when it gives none
-std::string RandomDigits() {
-  std::array<unsigned char, 16> bytes{};
-  if (getrandom(bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
-    return {};
-  }
-  constexpr std::string_view kDigits = "0123456789abcdef";
-  std::string out;
-  for (const unsigned char byte : bytes) {
-    out += kDigits[byte >> 4];
-    out += kDigits[byte & 0xF];
-  }
-  return out;
-}
+using TaskPointer = std::shared_ptr<Task>;
 
 void RunFunction(Task &task) {
   VORN::APIRequest request(task.request);
@@ -152,13 +137,14 @@ TaskRegistry::~TaskRegistry() = default;
 int TaskRegistry::Start(const Kind &kind, const VORN::APIRequest::State &request, Function function, void *context,
                         std::string &id) {
   auto task = std::make_shared<Task>();
-  const std::string random = RandomDigits();
+  const std::string random = RandomDigits(kIdBytes);
   if (random.empty() || function == nullptr) {
     return kTaskCannotStart;
   }
   task->id = kind.prefix + '_' + random;
   task->kind = kind;
   task->request = request;
+  task->request.polled = nullptr;
   task->function = function;
   task->context = context;
   const std::lock_guard lock(inner_->mutex);

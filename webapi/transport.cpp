@@ -1,5 +1,6 @@
 #include "webapi/transport.h"
 
+#include <openssl/err.h>
 #include <sys/socket.h>
 
 #include <cerrno>
@@ -14,7 +15,50 @@ Transport::Result ResultOfErrno() {
 
 } // namespace
 
+Transport::Transport(Socket socket, SSL_CTX *tls)
+    : socket_(std::move(socket)), tls_(tls == nullptr ? nullptr : SSL_new(tls)) {
+  if (tls_) {
+    SSL_set_accept_state(tls_.get());
+    SSL_set_fd(tls_.get(), socket_.native_handle());
+  }
+  broken_ = tls != nullptr && !tls_; // no memory
+}
+
+Transport::Result Transport::ResultOfTls(int returned, bool &wantsOther, int other) {
+  const int reason = SSL_get_error(tls_.get(), returned);
+  ERR_clear_error();
+  wantsOther = reason == other;
+  if (reason == SSL_ERROR_WANT_READ || reason == SSL_ERROR_WANT_WRITE) {
+    return Result::kWouldBlock;
+  }
+  broken_ = reason != SSL_ERROR_ZERO_RETURN;
+  return Result::kClosed;
+}
+
+Transport::Result Transport::ReadTls(char *buffer, size_t size, size_t &count) {
+  const int got = SSL_read_ex(tls_.get(), buffer, size, &count);
+  return got == 1 ? Result::kDone : ResultOfTls(got, readWantsWrite_, SSL_ERROR_WANT_WRITE);
+}
+
+Transport::Result Transport::WriteTls(std::string_view &bytes) {
+  while (!bytes.empty()) {
+    size_t sent = 0;
+    const int done = SSL_write_ex(tls_.get(), bytes.data(), bytes.size(), &sent);
+    if (done != 1) {
+      return ResultOfTls(done, writeWantsRead_, SSL_ERROR_WANT_READ);
+    }
+    bytes.remove_prefix(sent);
+  }
+  return Result::kDone;
+}
+
 Transport::Result Transport::Read(char *buffer, size_t size, size_t &count) {
+  if (broken_) {
+    return Result::kClosed;
+  }
+  if (tls_) {
+    return ReadTls(buffer, size, count);
+  }
   const ssize_t got = recv(socket_.native_handle(), buffer, size, MSG_DONTWAIT);
   if (got < 0) {
     return ResultOfErrno();
@@ -24,6 +68,12 @@ Transport::Result Transport::Read(char *buffer, size_t size, size_t &count) {
 }
 
 Transport::Result Transport::Write(std::string_view &bytes) {
+  if (broken_) {
+    return Result::kClosed;
+  }
+  if (tls_) {
+    return WriteTls(bytes);
+  }
   while (!bytes.empty()) {
     const ssize_t sent = send(socket_.native_handle(), bytes.data(), bytes.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
     if (sent < 0) {
@@ -35,6 +85,10 @@ Transport::Result Transport::Write(std::string_view &bytes) {
 }
 
 void Transport::CloseWriting() {
+  if (tls_ && !broken_) {
+    SSL_shutdown(tls_.get());
+    ERR_clear_error();
+  }
   shutdown(socket_.native_handle(), SHUT_WR);
 }
 

@@ -4,7 +4,10 @@
 
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/ip/tcp.hpp>
+#include <boost/asio/post.hpp>
+#include <memory>
 #include <mutex>
+#include <openssl/ssl.h>
 #include <string_view>
 #include <utility>
 
@@ -19,13 +22,20 @@ class Transport {
 public:
   enum class Result { kDone, kWouldBlock, kClosed };
 
-  explicit Transport(Socket socket) : socket_(std::move(socket)) {}
+  /// @param[in] tls  null: the bytes go as they are. The handshake is part of the first reads.
+  Transport(Socket socket, SSL_CTX *tls);
 
   template <typename Handler> void WaitReadable(Handler handler) {
-    socket_.async_wait(boost::asio::socket_base::wait_read, std::move(handler));
+    if (tls_ && SSL_has_pending(tls_.get()) == 1) {
+      boost::asio::post(socket_.get_executor(), [handler = std::move(handler)]() mutable { handler({}); });
+      return;
+    }
+    socket_.async_wait(readWantsWrite_ ? boost::asio::socket_base::wait_write : boost::asio::socket_base::wait_read,
+                       std::move(handler));
   }
   template <typename Handler> void WaitWritable(Handler handler) {
-    socket_.async_wait(boost::asio::socket_base::wait_write, std::move(handler));
+    socket_.async_wait(writeWantsRead_ ? boost::asio::socket_base::wait_read : boost::asio::socket_base::wait_write,
+                       std::move(handler));
   }
 
   /// @param[out] count  bytes read, 1 or more with kDone
@@ -43,8 +53,20 @@ public:
   void Abort();
 
 private:
+  struct FreeSsl {
+    void operator()(SSL *ssl) const { SSL_free(ssl); }
+  };
+
+  Result ResultOfTls(int returned, bool &wantsOther, int other);
+  Result ReadTls(char *buffer, size_t size, size_t &count);
+  Result WriteTls(std::string_view &bytes);
+
   Socket socket_;
-  std::mutex closing_; // the descriptor is not closed while another thread uses it
+  std::unique_ptr<SSL, FreeSsl> tls_;
+  bool readWantsWrite_ = false; // a read or write that the handshake turns round
+  bool writeWantsRead_ = false;
+  bool broken_ = false; // after a fault of TLS nothing may be sent
+  std::mutex closing_;  // the descriptor is not closed while another thread uses it
 };
 
 } // namespace vornwebapi

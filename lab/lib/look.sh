@@ -12,6 +12,7 @@ at() { # HOST COMMAND...
 call() { # API VERSION METHOD [BODY [CURL-OPTION...]]
   local path=/webapi/VORN.Core.Network.Router.$1/$2/$3 body=${4:-}
   curl --silent --noproxy '*' --max-time 40 --write-out '\n%{http_code}\n' --header 'Content-Type: application/json' \
+    --header "Authorization: Bearer $(cat "$state/token")" \
     --data-binary "$body" "${@:5}" "http://$api$path"
 }
 

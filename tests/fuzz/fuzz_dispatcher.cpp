@@ -5,6 +5,8 @@
 
 #include <cstdint>
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
 #include <stdexcept>
 
 using vornwebapi::HostRule;
@@ -22,8 +24,18 @@ void Throw(VORN::APIRequest *request, VORN::APIResponse * /*response*/) {
   throw std::runtime_error(request->GetParam("a", "").asString());
 }
 
+/// With a state of its own: the corpus has the token that stands in it.
+vornwebapi::Config MakeConfig() {
+  std::string folder = std::filesystem::temp_directory_path() / "fuzz_dispatcher.XXXXXX";
+  vornwebapi::Config config;
+  config.state = mkdtemp(folder.data());
+  std::ofstream(config.state + "/tokens")
+      << "000000000001 c7885720cc206bad14bd4e9d89f15aa1887b5214c0802cd9019770f571b90824 full 1 9999999999 0 fuzz\n";
+  return config;
+}
+
 Service &TheService() {
-  static const vornwebapi::Config kConfig;
+  static const vornwebapi::Config kConfig = MakeConfig();
   static Service service(kConfig, {{"A", 1, "get", Echo}, {"A", 2, "get", Throw}});
   return service;
 }

@@ -1,5 +1,7 @@
 #include "tests/webapi/http_client.h"
 
+#include "tests/webapi/server_process.h"
+
 #include <arpa/inet.h>
 #include <netinet/in.h>
 #include <poll.h>
@@ -114,7 +116,7 @@ std::string HttpClient::Bytes(std::chrono::milliseconds limit) {
 }
 
 std::string CallBytes(const std::string &path, const std::string &body, const std::string &fields) {
-  std::string bytes = "POST /webapi/" + path + " HTTP/1.1\r\nHost: localhost\r\n" + fields;
+  std::string bytes = "POST /webapi/" + path + " HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN "" + fields;
   if (!body.empty()) {
     bytes += "Content-Type: application/json\r\nContent-Length: " + std::to_string(body.size()) + "\r\n";
   }

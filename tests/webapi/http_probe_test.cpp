@@ -22,7 +22,7 @@ void PrintTo(const Probe &probe, std::ostream *out) {
   *out << probe.name;
 }
 
-const std::string kPost = "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n";
+const std::string kPost = "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN "";
 const std::string kJson = "Content-Type: application/json\r\n";
 
 std::string PostWith(const std::string &fields, const std::string &body = "{}") {
@@ -30,7 +30,7 @@ std::string PostWith(const std::string &fields, const std::string &body = "{}") 
 }
 
 std::string Line(const std::string &requestLine) {
-  return requestLine + "\r\nHost: localhost\r\n\r\n";
+  return requestLine + "\r\nHost: localhost\r\n" VORN_TEST_LOGIN "\r\n";
 }
 
 std::string Fields(int count) {
@@ -94,7 +94,7 @@ const std::vector<Probe> kHeaderProbes = {
     {"ConnectionWithAnEmptyOption", kPost + "Connection: a,,b\r\n\r\n", 400},
     {"UnknownExpectation", kPost + "Expect: miracles\r\n\r\n", 417},
     {"NoHost", "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\n\r\n", 400},
-    {"TwoHosts", kPost + "Host: localhost\r\n\r\n", 400},
+    {"TwoHosts", kPost + "Host: localhost\r\n" VORN_TEST_LOGIN "\r\n", 400},
     {"EmptyHost", "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost:\r\n\r\n", 400},
     {"ForeignHost", "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: evil.example\r\n\r\n", 421},
     {"ForeignAddressAsHost", "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: 192.0.2.1\r\n\r\n", 421},
@@ -178,7 +178,8 @@ TEST_F(HttpTest, ExpectContinueIsAnsweredBeforeTheBody) {
 
 TEST_F(HttpTest, ExpectContinueForAnUnknownRowIsRefusedAtOnce) {
   HttpClient client(server_.Port());
-  ExpectRefusal(client.Exchange("POST /webapi/none HTTP/1.1\r\nHost: localhost\r\nContent-Length: 2\r\n"
+  ExpectRefusal(client.Exchange("POST /webapi/none HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN
+                                "Content-Length: 2\r\n"
                                 "Expect: 100-continue\r\n\r\n"),
                 404);
   EXPECT_TRUE(client.ClosedByServer());
@@ -196,16 +197,18 @@ TEST_F(HttpTest, AConnectionLivesOnUnlessToldOtherwise) {
 
 TEST_F(HttpTest, Http10IsServedOnceAndNeedsNoHost) {
   HttpClient client(server_.Port());
-  EXPECT_EQ(client.Exchange("POST /webapi/VORN.Test.Echo/1/get HTTP/1.0\r\n\r\n").status, 200);
+  EXPECT_EQ(client.Exchange("POST /webapi/VORN.Test.Echo/1/get HTTP/1.0\r\n" VORN_TEST_LOGIN "\r\n").status, 200);
   EXPECT_TRUE(client.ClosedByServer());
 }
 
 TEST_F(HttpTest, OwnHostsAreTaken) {
   for (const char *host : {"localhost", "LOCALHOST:1", "127.0.0.1", "127.0.0.1:8080", "[::1]", "[::1]:443"}) {
     HttpClient client(server_.Port());
-    EXPECT_EQ(
-        client.Exchange(std::string("POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: ") + host + "\r\n\r\n").status,
-        200)
+    EXPECT_EQ(client
+                  .Exchange(std::string("POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: ") + host +
+                            "\r\n" VORN_TEST_LOGIN "\r\n")
+                  .status,
+              200)
         << host;
   }
 }
@@ -244,7 +247,7 @@ TEST_F(HttpTest, AClientThatGoesInTheMiddleCostsNothing) {
 
 TEST_F(HttpTest, TheOverrideOfAMethodIsIgnored) {
   HttpClient client(server_.Port());
-  ExpectRefusal(client.Exchange("GET /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n"
+  ExpectRefusal(client.Exchange("GET /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN ""
                                 "X-HTTP-Method-Override: POST\r\n\r\n"),
                 405);
 }

@@ -16,7 +16,7 @@ using vorntest::WebApiTest;
 
 namespace {
 
-const std::string kPost = "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n";
+const std::string kPost = "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN "";
 
 using Clock = std::chrono::steady_clock;
 

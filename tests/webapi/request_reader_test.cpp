@@ -1,5 +1,6 @@
 #include "webapi/request_reader.h"
 
+#include <cstdint>
 #include <gtest/gtest.h>
 
 using vornwebapi::HostRule;
@@ -18,7 +19,7 @@ protected:
     reader.Feed(bytes);
     State state = reader.Advance();
     if (state == State::kHead) {
-      reader.ReadBody();
+      reader.ReadBody(SIZE_MAX);
       state = reader.Advance();
     }
     return state;

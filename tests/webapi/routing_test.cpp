@@ -13,7 +13,8 @@ protected:
   HttpAnswer Request(const std::string &method, const std::string &target, const std::string &fields = "",
                      const std::string &body = "") const {
     HttpClient client(server_.Port());
-    return client.Exchange(method + " " + target + " HTTP/1.1\r\nHost: localhost\r\n" + fields + "\r\n" + body);
+    return client.Exchange(method + " " + target + " HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN "" + fields +
+                           "\r\n" + body);
   }
 };
 
@@ -67,7 +68,7 @@ TEST_F(RoutingTest, ARowIsCalledWithPostOnly) {
 
 TEST_F(RoutingTest, HeadGetsNoBody) {
   HttpClient client(server_.Port());
-  client.Send("HEAD /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n\r\n");
+  client.Send("HEAD /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\nHost: localhost\r\n" VORN_TEST_LOGIN "\r\n");
   const std::string bytes = client.Bytes(std::chrono::seconds(5));
   EXPECT_EQ(bytes.substr(0, 12), "HTTP/1.1 405");
   EXPECT_EQ(bytes.substr(bytes.size() - 4), "\r\n\r\n");

@@ -6,6 +6,8 @@
 #include <array>
 #include <csignal>
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
 
 namespace vorntest {
 
@@ -13,10 +15,44 @@ std::string ModulePath(const std::string &name) {
   return std::string(VORN_TEST_MODULES) + "/" + name + ".so";
 }
 
+namespace {
+
+/// A state folder with the one token of VORN_TEST_LOGIN, and a password that nothing matches.
+class StateOfTests {
+public:
+  StateOfTests() {
+    std::string pattern = std::filesystem::temp_directory_path() / "webapi_state.XXXXXX";
+    path_ = mkdtemp(pattern.data());
+    std::ofstream(path_ + "/password") << "none kept\n";
+    std::ofstream(path_ + "/tokens")
+        << "000000000001 c7885720cc206bad14bd4e9d89f15aa1887b5214c0802cd9019770f571b90824 full 1 9999999999 0 tests\n";
+  }
+  StateOfTests(const StateOfTests &) = delete;
+  StateOfTests &operator=(const StateOfTests &) = delete;
+  ~StateOfTests() {
+    std::error_code ignored;
+    std::filesystem::remove_all(path_, ignored);
+  }
+  const std::string &Path() const { return path_; }
+
+private:
+  std::string path_;
+};
+
+const std::string &KnownState() {
+  static const StateOfTests state;
+  return state.Path();
+}
+
+} // namespace
+
 ServerProcess::ServerProcess(const Setup &setup) {
   std::vector<std::string> words = {VORN_TEST_SERVER, "--log-stderr", "yes"};
   if (!setup.module.empty()) {
     words.insert(words.end(), {"--module", ModulePath(setup.module)});
+  }
+  if (setup.knownState) {
+    words.insert(words.end(), {"--state", KnownState()});
   }
   if (setup.listen) {
     words.insert(words.end(), {"--listen", "127.0.0.1:0"});

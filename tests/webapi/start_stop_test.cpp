@@ -72,7 +72,7 @@ void ExpectRefusedStart(const std::vector<std::string> &options, const std::stri
 
 TEST(StartTest, AnAddressBeyondThisMachineIsRefused) {
   for (const char *address : {"0.0.0.0:8080", "192.0.2.1:80", "[::]:8080", "[2001:db8::1]:80"}) {
-    ExpectRefusedStart({"--listen", address}, "is no loopback address");
+    ExpectRefusedStart({"--listen", address}, "is no loopback address: it needs tls, or plain-http");
   }
 }
 

@@ -81,7 +81,7 @@ TEST_F(TaskTest, ASecondOfItsKindIsRefusedWhileTheFirstRuns) {
   EXPECT_TRUE(next["success"].asBool());
   EXPECT_EQ(Listed(), 1U);
   EXPECT_EQ(Status(id)["error"]["data"], 111);
-  EXPECT_TRUE(server_.LogShows("poll task of kind test for user local refused with code 113"));
+  EXPECT_TRUE(server_.LogShows("poll task of kind test for user token 000000000001 tests refused with code 113"));
 }
 
 TEST_F(TaskTest, ANinthIsRefusedUntilOneHasEnded) {

@@ -1,0 +1,244 @@
+// Who is let through, and who is not.
+#include "tests/webapi/webapi_fixture.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <fstream>
+
+using vorntest::ExpectRefusal;
+using vorntest::Folder;
+using vorntest::HttpAnswer;
+using vorntest::HttpClient;
+using vorntest::ParseJson;
+using vorntest::ServerProcess;
+
+namespace {
+
+constexpr const char *kPassword = "correct horse";
+constexpr const char *kEcho = "VORN.Test.Echo/1/get";
+
+struct Person {
+  std::string cookie;
+  std::string csrf;
+  std::string Fields() const { return "Cookie: vorn-session=" + cookie + "\r\nX-CSRF-Token: " + csrf + "\r\n"; }
+};
+
+class AccessTest : public testing::Test {
+protected:
+  explicit AccessTest(std::vector<std::string> more = {})
+      : server_({.options = Options(std::move(more)), .knownState = false}) {}
+
+  void SetUp() override {
+    ASSERT_NE(server_.Port(), 0) << server_.Log();
+    std::getline(std::ifstream(State("first-password")), first_);
+  }
+  void TearDown() override {
+    EXPECT_EQ(server_.Stop(), 0) << server_.Log();
+    EXPECT_EQ(server_.Log().find("Sanitizer"), std::string::npos) << server_.Log();
+  }
+
+  std::vector<std::string> Options(std::vector<std::string> more) const {
+    more.insert(more.end(), {"--state", folder_.Path("state")});
+    return more;
+  }
+  std::string State(const std::string &name) const { return folder_.Path("state/" + name); }
+
+  /// A call with just the fields given.
+  HttpAnswer Send(const std::string &path, const std::string &fields, const std::string &body = "",
+                  const std::string &method = "POST") const {
+    HttpClient client(server_.Port());
+    std::string bytes = method + " /webapi/" + path + " HTTP/1.1\r\nHost: localhost\r\n" + fields;
+    if (!body.empty()) {
+      bytes += "Content-Type: application/json\r\nContent-Length: " + std::to_string(body.size()) + "\r\n";
+    }
+    return client.Exchange(bytes + "\r\n" + body);
+  }
+  static std::string LoginBody(const std::string &password, const std::string &user = "admin") {
+    return R"({"user":")" + user + R"(","password":")" + password + "\"}";
+  }
+  Person Login(const std::string &password, const std::string &fields = "") const {
+    HttpAnswer answer = Send("login", fields, LoginBody(password));
+    EXPECT_EQ(answer.status, 200) << answer.body;
+    const std::string cookie = answer.fields["set-cookie"];
+    const size_t begin = cookie.find('=') + 1;
+    return {cookie.substr(begin, cookie.find(';') - begin), ParseJson(answer.body)["data"]["csrf"].asString()};
+  }
+  /// With the first password changed.
+  Person Enter() const {
+    const Person first = Login(first_);
+    EXPECT_EQ(Send("password", first.Fields(), R"({"old":")" + first_ + R"(","new":")" + kPassword + "\"}").status,
+              200);
+    return Login(kPassword);
+  }
+  std::string MakeToken(const Person &person, const std::string &access) const {
+    const HttpAnswer answer =
+        Send("tokens/make", person.Fields(), R"({"name":"t","days":1,"access":")" + access + "\"}");
+    EXPECT_EQ(answer.status, 200) << answer.body;
+    return ParseJson(answer.body)["data"]["token"].asString();
+  }
+
+  Folder folder_;
+  ServerProcess server_;
+  std::string first_;
+};
+
+TEST_F(AccessTest, TheStateIsItsOwnersAlone) {
+  struct stat info {};
+  ASSERT_EQ(stat(folder_.Path("state").c_str(), &info), 0);
+  EXPECT_EQ(info.st_mode & 07777U, 0700U);
+  for (const char *name : {"password", "first-password"}) {
+    ASSERT_EQ(stat(State(name).c_str(), &info), 0);
+    EXPECT_EQ(info.st_mode & 07777U, 0600U);
+  }
+  std::string stored;
+  std::getline(std::ifstream(State("password")), stored);
+  EXPECT_EQ(stored.rfind("$argon2id$", 0), 0U) << stored;
+}
+
+TEST_F(AccessTest, TheFirstPasswordMustBeChanged) {
+  const Person person = Login(first_);
+  ExpectRefusal(Send(kEcho, person.Fields()), 403);
+  ExpectRefusal(Send("tokens/make", person.Fields(), R"({"name":"t","days":1,"access":"full"})"), 403);
+  const Person entered = Enter();
+  EXPECT_EQ(Send(kEcho, entered.Fields()).status, 200);
+  EXPECT_NE(access(State("first-password").c_str(), F_OK), 0);
+  ExpectRefusal(Send("login", "", LoginBody(first_)), 401);
+}
+
+TEST_F(AccessTest, WithoutASessionNothingIsReached) {
+  const Person person = Enter();
+  const std::string cookie = "Cookie: vorn-session=" + person.cookie + "\r\n";
+  const std::string csrf = "X-CSRF-Token: " + person.csrf + "\r\n";
+  const Person other = Login(kPassword);
+  for (const char *path : {kEcho, "VORN.Test.None/1/get", "logout", "tokens/list", "x"}) {
+    ExpectRefusal(Send(path, ""), 401);
+    ExpectRefusal(Send(path, csrf + "Cookie: vorn-session=\r\n"), 401);
+    ExpectRefusal(Send(path, csrf + "Cookie: vorn-session=" + person.cookie + "0\r\n"), 401);
+    ExpectRefusal(Send(path, csrf + "Cookie: vorn-session=" + person.cookie.substr(1) + "\r\n"), 401);
+    ExpectRefusal(Send(path, csrf + "Cookie: vorn-session=x; vorn-session=" + person.cookie + "\r\n"), 401);
+    ExpectRefusal(Send(path, csrf + "Cookie: vorn-session=" + person.cookie + "; vorn-session=x\r\n"), 401);
+    ExpectRefusal(Send(path, csrf + cookie + "Cookie: vorn-session=x\r\n"), 401);
+    ExpectRefusal(Send(path, "Authorization: Bearer " + person.cookie + "\r\n"), 401);
+    ExpectRefusal(Send(path, person.Fields() + "Authorization: Basic YTpi\r\n"), 401);
+    ExpectRefusal(Send(path, cookie), 403);
+    ExpectRefusal(Send(path, cookie + "X-CSRF-Token: " + other.csrf + "\r\n"), 403);
+    ExpectRefusal(Send(path, cookie + csrf + csrf), 403);
+  }
+  EXPECT_EQ(Send(kEcho, person.Fields()).status, 200);
+  ExpectRefusal(Send(kEcho, person.Fields() + "X-HTTP-Method-Override: POST\r\n", "", "GET"), 405);
+}
+
+TEST_F(AccessTest, OtherSitesAreRefusedBeforeAnything) {
+  const Person person = Enter();
+  for (const char *fields : {"Origin: http://evil.example\r\n", "Origin: null\r\n", "Origin: https://localhost\r\n",
+                             "Origin: http://localhost\r\nOrigin: http://localhost\r\n",
+                             "Sec-Fetch-Site: cross-site\r\n", "Sec-Fetch-Site: same-site\r\n"}) {
+    ExpectRefusal(Send(kEcho, person.Fields() + fields), 403);
+    ExpectRefusal(Send("login", fields, LoginBody(kPassword)), 403);
+  }
+  EXPECT_EQ(Send(kEcho, person.Fields() + "Origin: http://localhost\r\nSec-Fetch-Site: same-origin\r\n").status, 200);
+}
+
+TEST_F(AccessTest, LogoutAndPasswordChangeEndSessions) {
+  const Person gone = Enter();
+  EXPECT_EQ(Send("logout", gone.Fields()).status, 200);
+  ExpectRefusal(Send(kEcho, gone.Fields()), 401);
+  const Person one = Login(kPassword);
+  const Person two = Login(kPassword);
+  EXPECT_EQ(Send("password", one.Fields(), R"({"old":"correct horse","new":"another horse"})").status, 200);
+  ExpectRefusal(Send(kEcho, one.Fields()), 401);
+  ExpectRefusal(Send(kEcho, two.Fields()), 401);
+}
+
+TEST_F(AccessTest, ALoginMakesANewSession) {
+  Enter();
+  const Person person = Login(kPassword, "Cookie: vorn-session=chosen\r\n");
+  EXPECT_NE(person.cookie, "chosen");
+  EXPECT_EQ(person.cookie.size(), 64U);
+  ExpectRefusal(Send(kEcho, "Cookie: vorn-session=chosen\r\nX-CSRF-Token: " + person.csrf + "\r\n"), 401);
+  Login(kPassword, person.Fields());
+  ExpectRefusal(Send(kEcho, person.Fields()), 401);
+}
+
+TEST_F(AccessTest, UserAndPasswordAreToldApartByNobody) {
+  Enter();
+  const HttpAnswer wrong = Send("login", "", LoginBody("wrong"));
+  const HttpAnswer unknown = Send("login", "", LoginBody(kPassword, "nobody"));
+  ExpectRefusal(wrong, 401);
+  EXPECT_EQ(wrong.body, unknown.body);
+  ExpectRefusal(Send("login", "", LoginBody(std::string(kPassword) + "\\u0000x")), 401);
+  EXPECT_EQ(server_.Log().find(kPassword), std::string::npos);
+}
+
+TEST_F(AccessTest, LoginBodiesAreBounded) {
+  ExpectRefusal(Send("login", "", LoginBody(std::string(5000, 'x'))), 413);
+  for (const char *body : {"{}", R"({"user":"admin"})", R"({"user":1,"password":[]})", R"(["admin"])"}) {
+    ExpectRefusal(Send("login", "", body), 400);
+  }
+}
+
+TEST_F(AccessTest, AReadingTokenOnlyReads) {
+  const Person person = Enter();
+  const std::string reads = "Authorization: Bearer " + MakeToken(person, "read") + "\r\n";
+  const std::string writes = "Authorization: Bearer " + MakeToken(person, "full") + "\r\n";
+  EXPECT_EQ(Send(kEcho, reads).status, 200);
+  ExpectRefusal(Send("VORN.Test.Callback/1/set", reads), 403);
+  EXPECT_EQ(Send("VORN.Test.Callback/1/set", writes).status, 200);
+  ExpectRefusal(Send("tokens/make", writes, R"({"name":"t","days":1,"access":"full"})"), 403);
+  ExpectRefusal(Send("password", writes, R"({"old":"correct horse","new":"another horse"})"), 403);
+  const Json::Value list = ParseJson(Send("tokens/list", person.Fields()).body)["data"];
+  ASSERT_EQ(list.size(), 2U);
+  for (const Json::Value &token : list) {
+    EXPECT_TRUE(token["used"].isIntegral());
+    EXPECT_EQ(Send("tokens/revoke", person.Fields(), R"({"id":")" + token["id"].asString() + "\"}").status, 200);
+  }
+  ExpectRefusal(Send(kEcho, reads), 401);
+  ExpectRefusal(Send(kEcho, writes), 401);
+}
+
+TEST_F(AccessTest, AnExpiredTokenIsNone) {
+  const Person person = Enter();
+  const std::string field = "Authorization: Bearer " + MakeToken(person, "full") + "\r\n";
+  server_.Stop();
+  std::string id;
+  std::string digest;
+  std::ifstream(State("tokens")) >> id >> digest;
+  std::ofstream(State("tokens")) << id << ' ' << digest << " full 1 2 0 t\n";
+  ServerProcess again({.options = Options({}), .knownState = false});
+  HttpClient client(again.Port());
+  ExpectRefusal(
+      client.Exchange(std::string("POST /webapi/") + kEcho + " HTTP/1.1\r\nHost: localhost\r\n" + field + "\r\n"), 401);
+}
+
+TEST_F(AccessTest, AfterTenFailuresEachTryWaits) {
+  const Person person = Enter();
+  for (int count = 0; count < 10; ++count) {
+    ExpectRefusal(Send("login", "", LoginBody("wrong")), 401);
+  }
+  HttpAnswer later = Send("login", "", LoginBody(kPassword));
+  ExpectRefusal(later, 429);
+  EXPECT_GT(std::stoi(later.fields["retry-after"]), 50);
+  EXPECT_EQ(Send(kEcho, person.Fields()).status, 200);
+}
+
+class ShortSessionTest : public AccessTest {
+protected:
+  ShortSessionTest() : AccessTest({"--session-idle-time", "1500ms"}) {}
+};
+
+TEST_F(ShortSessionTest, PollingDoesNotKeepASession) {
+  const Person person = Enter();
+  const Person active = Login(kPassword);
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(2);
+  while (std::chrono::steady_clock::now() < end) {
+    EXPECT_EQ(Send(kEcho, active.Fields()).status, 200);
+    Send(kEcho, person.Fields() + "X-Poll: 1\r\n");
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));
+  }
+  ExpectRefusal(Send(kEcho, person.Fields()), 401);
+  EXPECT_EQ(Send(kEcho, active.Fields()).status, 200);
+}
+
+} // namespace
