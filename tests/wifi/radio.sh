@@ -4,6 +4,7 @@
 
 readonly PHONE=1 LAPTOP=2 TABLET=3 # the numbers of their radios
 readonly work=/tmp/radio
+readonly state=$work # where lab/lib/look.sh takes the token from
 hostapd=
 server=
 
@@ -56,6 +57,7 @@ networks_are_on() {
 }
 
 start_server() {
+  [ -s "$state/token" ] || (umask 077 && "$build/webapi/vornwebd" --make-token radio >"$state/token") || return
   "$build/webapi/vornwebd" --module "$build/router/router.so" --listen "$api" 2>>"$work/server.log" &
   server=$!
   eventually 20 server_answers
