@@ -20,8 +20,9 @@ struct OwnPath {
 };
 
 // None has the form of a row's path, which has three parts behind "/webapi/".
-constexpr std::array<OwnPath, 6> kOwnPaths = {{{"/webapi/login", OwnCall::kLogin},
+constexpr std::array<OwnPath, 7> kOwnPaths = {{{"/webapi/login", OwnCall::kLogin},
                                                {"/webapi/logout", OwnCall::kLogout},
+                                               {"/webapi/session", OwnCall::kSession},
                                                {"/webapi/password", OwnCall::kPassword},
                                                {"/webapi/tokens/list", OwnCall::kTokenList},
                                                {"/webapi/tokens/make", OwnCall::kTokenMake},
@@ -95,7 +96,8 @@ bool Access::Open(std::string &firstPassword, std::string &fault) {
   return folder_.Open(fault) && account_.Open(firstPassword, fault) && tokens_.Open(fault);
 }
 
-std::optional<Caller> Access::Identify(const RequestHead &head, const Peer &peer, std::optional<Answer> &refused) {
+std::optional<Caller> Access::Identify(const RequestHead &head, const Peer &peer, OwnCall own,
+                                       std::optional<Answer> &refused) {
   if (!head.authorization.empty()) {
     const std::optional<std::string> text = BearerToken(head);
     const std::optional<Token> token = text ? tokens_.Find(*text) : std::nullopt;
@@ -110,6 +112,10 @@ std::optional<Caller> Access::Identify(const RequestHead &head, const Peer &peer
   if (!csrf) {
     refused = NotLoggedIn();
     return std::nullopt;
+  }
+  // Asking for the session tells the page its token: it changes nothing, and no other site can read the answer.
+  if (own == OwnCall::kSession) {
+    return Caller(kAdministrator, *cookie, "", false);
   }
   if (head.csrf.size() != 1 || !SameSecret(head.csrf.front(), *csrf)) {
     refused = Forbidden("the X-CSRF-Token of this session is missing");
@@ -128,13 +134,15 @@ Decision Access::Decide(const RequestHead &head, const Peer &peer) {
   if (decision.own == OwnCall::kLogin) {
     return decision;
   }
-  decision.caller = Identify(head, peer, decision.refused);
+  decision.caller = Identify(head, peer, decision.own, decision.refused);
   if (!decision.caller) {
     return decision;
   }
   const Caller &caller = *decision.caller;
   if (!caller.session_.empty()) {
-    if (account_.MustChange() && decision.own != OwnCall::kPassword && decision.own != OwnCall::kLogout) {
+    const bool permitted =
+        decision.own == OwnCall::kPassword || decision.own == OwnCall::kLogout || decision.own == OwnCall::kSession;
+    if (account_.MustChange() && !permitted) {
       decision.refused = Forbidden("the first password must be changed");
     }
   } else if (decision.own != OwnCall::kNone) {

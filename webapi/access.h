@@ -42,7 +42,7 @@ private:
 };
 
 /// The server's own calls, beside the module's rows.
-enum class OwnCall { kNone, kLogin, kLogout, kPassword, kTokenList, kTokenMake, kTokenRevoke };
+enum class OwnCall { kNone, kLogin, kLogout, kSession, kPassword, kTokenList, kTokenMake, kTokenRevoke };
 
 /// Whether it goes on with a request.
 struct Decision {
@@ -75,7 +75,8 @@ public:
   const StateFolder &State() const { return folder_; }
 
 private:
-  std::optional<Caller> Identify(const RequestHead &head, const Peer &peer, std::optional<Answer> &refused);
+  std::optional<Caller> Identify(const RequestHead &head, const Peer &peer, OwnCall own,
+                                 std::optional<Answer> &refused);
 
   int sodium_; // below 0: the library cannot be used
   StateFolder folder_;

@@ -44,6 +44,15 @@ Answer Refuse(Account::Verdict verdict, Account &account, const Peer &peer, cons
   }
 }
 
+/// What a page must know of its session.
+Json::Value Describe(const std::string &csrf, Account &account) {
+  Json::Value data(Json::objectValue);
+  data["user"] = kAdministrator;
+  data["csrf"] = csrf;
+  data["must_change"] = account.MustChange();
+  return data;
+}
+
 Answer Login(Access &access, const Peer &peer, const RequestHead &head, const Json::Value &parameters) {
   if (!parameters["user"].isString() || !parameters["password"].isString()) {
     return BadBody("user and password are texts");
@@ -61,13 +70,14 @@ Answer Login(Access &access, const Peer &peer, const RequestHead &head, const Js
     return HandlerFailed();
   }
   Log(LogKind::kLogin, "%s logged in from %s", kAdministrator, peer.from.c_str());
-  Json::Value data(Json::objectValue);
-  data["user"] = kAdministrator;
-  data["csrf"] = made->csrf;
-  data["must_change"] = account.MustChange();
-  Answer answer = Done(data);
+  Answer answer = Done(Describe(made->csrf, account));
   answer.cookie = Cookie(peer.secure, made->id);
   return answer;
+}
+
+Answer TellSession(Access &access, const Caller &caller) {
+  const std::optional<std::string> csrf = access.Sessions().Find(caller.SessionId());
+  return csrf ? Done(Describe(*csrf, access.TheAccount())) : NotLoggedIn();
 }
 
 Answer Logout(Access &access, const Caller &caller, const Peer &peer) {
@@ -175,6 +185,8 @@ Answer RunOwnCall(OwnCall call, Access &access, const Caller *caller, const Peer
   switch (call) {
   case OwnCall::kLogout:
     return Logout(access, *caller, peer);
+  case OwnCall::kSession:
+    return TellSession(access, *caller);
   case OwnCall::kPassword:
     return ChangePassword(access, peer, parameters);
   case OwnCall::kTokenList:

@@ -107,6 +107,24 @@ TEST_F(AccessTest, TheFirstPasswordMustBeChanged) {
   ExpectRefusal(Send("login", "", LoginBody(first_)), 401);
 }
 
+TEST_F(AccessTest, APageThatIsLoadedAnewIsToldItsSession) {
+  const Person first = Login(first_);
+  const std::string cookie = "Cookie: vorn-session=" + first.cookie + "\r\n";
+  EXPECT_EQ(ParseJson(Send("session", cookie).body)["data"],
+            ParseJson(R"({"user":"admin","must_change":true,"csrf":")" + first.csrf + "\"}"));
+  ExpectRefusal(Send("session", ""), 401);
+  ExpectRefusal(Send("session", "X-CSRF-Token: " + first.csrf + "\r\n"), 401);
+  ExpectRefusal(Send("session", cookie + "Origin: http://evil.example\r\n"), 403);
+  ExpectRefusal(Send("session", cookie + "Sec-Fetch-Site: same-site\r\n"), 403);
+  ExpectRefusal(Send("session", cookie, "", "GET"), 405);
+  ExpectRefusal(Send(kEcho, cookie), 403); // what it needs no token for is this call alone
+  const Person entered = Enter();
+  ExpectRefusal(Send("session", cookie), 401); // the password was changed
+  const std::string now = "Cookie: vorn-session=" + entered.cookie + "\r\n";
+  EXPECT_EQ(ParseJson(Send("session", now).body)["data"]["must_change"], false);
+  ExpectRefusal(Send("session", "Authorization: Bearer " + MakeToken(entered, "full") + "\r\n"), 403);
+}
+
 TEST_F(AccessTest, WithoutASessionNothingIsReached) {
   const Person person = Enter();
   const std::string cookie = "Cookie: vorn-session=" + person.cookie + "\r\n";
