@@ -44,6 +44,18 @@ bool FromElsewhere(const RequestHead &head, const Peer &peer) {
   return !origin || !site;
 }
 
+/// What lies outside "/webapi" is the page's, and the page is everyone's.
+bool OfPage(const RequestHead &head) {
+  constexpr std::string_view kCalls = "/webapi";
+  return (head.method == "GET" || head.method == "HEAD") && head.target.compare(0, kCalls.size(), kCalls) != 0;
+}
+
+/// A link on another site may lead to the page; nothing of the page may be made part of another site's.
+bool Navigates(const RequestHead &head) {
+  return head.origin.empty() && head.fetchMode == std::vector<std::string>{"navigate"} &&
+         head.fetchDest == std::vector<std::string>{"document"};
+}
+
 std::optional<std::string> BearerToken(const RequestHead &head) {
   constexpr std::string_view kScheme = "bearer ";
   if (head.authorization.size() != 1 || Lower(head.authorization.front().substr(0, kScheme.size())) != kScheme) {
@@ -126,12 +138,13 @@ std::optional<Caller> Access::Identify(const RequestHead &head, const Peer &peer
 
 Decision Access::Decide(const RequestHead &head, const Peer &peer) {
   Decision decision;
-  if (FromElsewhere(head, peer)) {
+  decision.own = FindOwn(head.target);
+  decision.page = decision.own == OwnCall::kNone && OfPage(head);
+  if (FromElsewhere(head, peer) && !(decision.page && Navigates(head))) {
     decision.refused = Forbidden("the request comes from another site");
     return decision;
   }
-  decision.own = FindOwn(head.target);
-  if (decision.own == OwnCall::kLogin) {
+  if (decision.page || decision.own == OwnCall::kLogin) {
     return decision;
   }
   decision.caller = Identify(head, peer, decision.own, decision.refused);

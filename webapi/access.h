@@ -47,8 +47,9 @@ enum class OwnCall { kNone, kLogin, kLogout, kSession, kPassword, kTokenList, kT
 /// Whether it goes on with a request.
 struct Decision {
   std::optional<Answer> refused;
-  std::optional<Caller> caller; ///< none with kLogin
+  std::optional<Caller> caller; ///< none with kLogin and for the page
   OwnCall own = OwnCall::kNone;
+  bool page = false; ///< one of the page's files is asked for, or what is none: nothing is called
 };
 
 /// @return true for methods that change nothing: "get", "getcount", "test" and "tablesget"

@@ -28,7 +28,7 @@ Answer RefusedAndClosed(unsigned status, std::string_view message) {
 
 /// For browsers: an answer is data, shown by no page and kept nowhere.
 constexpr std::string_view kBrowserFields =
-    "\r\nCache-Control: no-store\r\nX-Content-Type-Options: nosniff\r\n"
+    "Cache-Control: no-store\r\nX-Content-Type-Options: nosniff\r\n"
     "Content-Security-Policy: default-src 'none'; frame-ancestors 'none'; base-uri 'none'; form-action 'none'\r\n"
     "X-Frame-Options: DENY\r\nReferrer-Policy: no-referrer\r\nCross-Origin-Opener-Policy: same-origin\r\n"
     "Cross-Origin-Resource-Policy: same-origin\r\n";
@@ -77,6 +77,12 @@ Answer TooManyTries(unsigned retryAfter) {
 }
 Answer NotFound() {
   return Refused(404, "no such row");
+}
+Answer NoPage() {
+  return Refused(404, "no page is installed here");
+}
+Answer NoSuchFile() {
+  return Refused(404, "no such file");
 }
 Answer MethodNotAllowed() {
   Answer answer = Refused(405, "a row is called with POST");
@@ -138,9 +144,16 @@ std::string Render(const Answer &answer, bool keepAlive, bool headOnly) {
   out.append(reason.data(), reason.size());
   out += "\r\nDate: ";
   out += DateText();
-  out += "\r\nContent-Type: application/json\r\nContent-Length: ";
-  out += std::to_string(answer.body.size());
-  out += kBrowserFields;
+  out += "\r\n";
+  if (answer.fileFields.empty()) {
+    out += "Content-Type: application/json\r\n";
+    out += kBrowserFields;
+  } else {
+    out += answer.fileFields;
+  }
+  if (answer.status != 304) { // it has no body, whatever it would say of one (RFC 9110, section 15.4.5)
+    out.append("Content-Length: ").append(std::to_string(answer.body.size() + answer.file.size())).append("\r\n");
+  }
   if (!answer.cookie.empty()) {
     out.append("Set-Cookie: ").append(answer.cookie).append("\r\n");
   }

@@ -3,6 +3,7 @@
 #define WEBAPI_ANSWER_H
 
 #include <string>
+#include <string_view>
 
 namespace vornwebapi {
 
@@ -13,6 +14,9 @@ struct Answer {
   const char *allow = nullptr;
   std::string cookie;      ///< the value of Set-Cookie; empty: none
   unsigned retryAfter = 0; ///< seconds; 0: not said
+  /// A file of the page in place of `body`, and the header's lines that go with it. Both outlive the connection.
+  std::string_view file = {};
+  std::string_view fileFields = {};
 };
 
 /// A handler's own answer.
@@ -27,6 +31,8 @@ Answer WrongPassword();
 Answer Forbidden(const char *reason);
 Answer TooManyTries(unsigned retryAfter);
 Answer NotFound();
+Answer NoPage();     ///< none is installed
+Answer NoSuchFile(); ///< of the page
 Answer MethodNotAllowed();
 Answer RequestTimeout();
 Answer BodyTooLarge();
@@ -43,7 +49,7 @@ Answer Stopping();
 Answer TooManyConnections();
 Answer UnknownVersion();
 
-/// The bytes on the wire.
+/// The bytes on the wire; of a file its header only.
 /// @param[in] keepAlive  the client may go on using the connection
 /// @param[in] headOnly   without the body, as HEAD asks for
 std::string Render(const Answer &answer, bool keepAlive, bool headOnly);

@@ -28,11 +28,12 @@ struct Key {
 
 constexpr size_t kDay = 86'400'000;
 
-constexpr std::array<Key, 35> kKeys = {{
+constexpr std::array<Key, 36> kKeys = {{
     {"listen", &Config::listen, 0, 0, "address and port; port 0: any free one; [::1]:8080 for IPv6"},
     {"module", &Config::module, 0, 0, "the shared library to serve"},
     {"host-names", &Config::hostNames, 0, 0, "names, beside localhost, that a request may have in Host"},
     {"state", &Config::state, 0, 0, "folder of the password, the tokens and the certificate"},
+    {"page", &Config::page, 0, 0, "folder of the web page, read whole at the start; one that is not there: no page"},
     {"tls", &Config::tls, 0, 0, "yes: HTTPS, with a certificate that is made at the first start"},
     {"plain-http", &Config::plainHttp, 0, 0, "yes: HTTP without TLS may be served beyond loopback"},
     {"log-stderr", &Config::logToStandardError, 0, 0, "yes: log to the standard error stream too"},

@@ -16,6 +16,7 @@ struct Config {
   std::string module;
   std::string hostNames; ///< blank-separated
   std::string state = "/var/lib/vorn";
+  std::string page = "/usr/share/vorn/page";
   bool tls = false;
   bool plainHttp = false;
   bool logToStandardError = false;

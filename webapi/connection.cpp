@@ -198,6 +198,7 @@ void Connection::Call() {
 }
 
 void Connection::Send(const Answer &answer) {
+  file_ = session_.HeadOnly() ? std::string_view() : answer.file;
   out_ = session_.Finish(answer, shared_.stopping, closeAfter_);
   unsent_ = out_;
   Enter(Phase::kWrite, shared_.config.writeTime);
@@ -207,7 +208,12 @@ void Connection::Send(const Answer &answer) {
 void Connection::Write() {
   switch (transport_.Write(unsent_)) {
   case Transport::Result::kDone:
-    OnWritten(true);
+    if (!file_.empty()) {
+      unsent_ = std::exchange(file_, {});
+      Write();
+    } else {
+      OnWritten(true);
+    }
     break;
   case Transport::Result::kWouldBlock:
     transport_.WaitWritable([self = shared_from_this()](boost::system::error_code fault) {

@@ -71,7 +71,8 @@ private:
   std::atomic<Connections::Clock::rep> deadline_{0}; // of the running phase, in the clock's ticks since its epoch
   std::atomic<bool> expired_{false};
   std::string out_;         // the answer being written
-  std::string_view unsent_; // of out_
+  std::string_view unsent_; // of out_, then of the file
+  std::string_view file_;   // of the page, to be sent behind out_; not copied for each who asks
   bool closeAfter_ = false; // the answer ends the connection
   Callbacks callbacks_;     // of the answer being written; with any, a slot is held for them
   size_t drained_ = 0;

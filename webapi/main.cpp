@@ -124,6 +124,7 @@ int main(int argc, char **argv) {
     return Refuse(fault);
   }
   vornwebapi::Service service(config, rows);
+  service.Page().Load(config.page);
   vornwebapi::TlsContext tls;
   if (!OpenState(config, service.Gate(), tls, fault)) {
     return Refuse(fault);

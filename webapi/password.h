@@ -33,7 +33,8 @@ private:
 /// A password for the first login: 100 bits, in letters and digits that are not mistaken for each other.
 std::string RandomPassword();
 
-/// A short digest of a random text of 128 bits or more, as hexadecimal digits. Not for passwords.
+/// BLAKE2b-256 as hexadecimal digits: of a random text of 128 bits or more, which it hides, or of a file. Not for
+/// passwords.
 std::string DigestOf(const std::string &secret);
 
 /// Equal, in a time that depends on the lengths only.

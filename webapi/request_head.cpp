@@ -211,9 +211,13 @@ std::optional<Answer> ReadHead(const http::request_header<> &header, const HostR
   head.host = Find(header, http::field::host).value;
   head.origin = Values(header, "Origin");
   head.fetchSite = Values(header, "Sec-Fetch-Site");
+  head.fetchMode = Values(header, "Sec-Fetch-Mode");
+  head.fetchDest = Values(header, "Sec-Fetch-Dest");
   head.authorization = Values(header, "Authorization");
   head.cookies = Values(header, "Cookie");
   head.csrf = Values(header, "X-CSRF-Token");
+  head.acceptEncoding = Values(header, "Accept-Encoding");
+  head.ifNoneMatch = Values(header, "If-None-Match");
   head.poll = !Values(header, "X-Poll").empty();
   const Field language = Find(header, http::field::accept_language);
   head.language = LanguageCode(language.count == 1 ? language.value : "");

@@ -20,10 +20,14 @@ struct RequestHead {
   std::string host;                   ///< as it stands; empty: none
   std::vector<std::string> origin;    ///< these: every value that was sent
   std::vector<std::string> fetchSite; ///< Sec-Fetch-Site
+  std::vector<std::string> fetchMode; ///< Sec-Fetch-Mode
+  std::vector<std::string> fetchDest; ///< Sec-Fetch-Dest
   std::vector<std::string> authorization;
   std::vector<std::string> cookies;
   std::vector<std::string> csrf; ///< X-CSRF-Token
-  bool poll = false;             ///< X-Poll: the page asks by itself, nobody may be there
+  std::vector<std::string> acceptEncoding;
+  std::vector<std::string> ifNoneMatch;
+  bool poll = false; ///< X-Poll: the page asks by itself, nobody may be there
   bool keepAlive = true;
   bool hasBody = false;
   bool chunked = false;

@@ -8,6 +8,7 @@
 #include "webapi/json_scanner.h"
 #include "webapi/request_reader.h"
 #include "webapi/request_state.h"
+#include "webapi/static_files.h"
 #include "webapi/task_registry.h"
 
 #include <string>
@@ -31,7 +32,7 @@ struct Outcome {
   Callbacks callbacks; ///< to be run when the answer was handed to the kernel, or could not be
 };
 
-/// Every member may be called from any thread; nothing changes after construction but the tasks and who is
+/// Every member may be called from any thread, once the page is loaded; nothing changes then but the tasks and who is
 /// logged in.
 class Service {
 public:
@@ -41,6 +42,7 @@ public:
   const std::vector<std::string> &HostNames() const { return hostNames_; }
   TaskRegistry &Tasks() { return tasks_; }
   Access &Gate() { return access_; }
+  StaticFiles &Page() { return page_; }
   size_t LoginBodyBytes() const { return loginBodyBytes_; }
 
   /// @param[in] path  the request's target, compared byte by byte
@@ -65,6 +67,7 @@ private:
   std::vector<std::string> hostNames_; // lower case
   JsonLimits json_;
   TaskRegistry tasks_;
+  StaticFiles page_;
   std::unordered_map<std::string, Route, Hash, std::equal_to<>> routes_;
 };
 

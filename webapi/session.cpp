@@ -34,6 +34,9 @@ Session::Wants Session::Head() {
   if (decision_.refused) {
     return Refuse(*decision_.refused);
   }
+  if (decision_.page) {
+    return Refuse(service_.Page().Get(head));
+  }
   const bool own = decision_.own != OwnCall::kNone;
   route_ = own ? nullptr : service_.Find(head.target);
   if (!own && route_ == nullptr) {
@@ -67,7 +70,7 @@ std::string Session::Finish(const Answer &answer, bool stopping, bool &close) {
   // A request whose body was not read leaves the connection where no one can tell body from request.
   const bool whole = state_ == RequestReader::State::kDone || (state_ == RequestReader::State::kHead && !head.hasBody);
   close = answer.close || stopping || !whole || !head.keepAlive;
-  std::string text = Render(answer, !close, head.method == "HEAD");
+  std::string text = Render(answer, !close, HeadOnly());
   if (!close) {
     reader_.Next();
     decision_ = {};

@@ -17,7 +17,7 @@ public:
     kBytes,    ///< Feed it
     kContinue, ///< send ContinueText, then go on
     kCall,     ///< Call, or Refuse, then send the outcome and go on
-    kAnswer    ///< send Refusal, then go on
+    kAnswer    ///< send Refusal, which may also be a file of the page, then go on
   };
 
   Session(Service &service, HostRule hosts, Peer peer);
@@ -32,8 +32,9 @@ public:
   static std::string_view ContinueText() { return "HTTP/1.1 100 Continue\r\n\r\n"; }
 
   Outcome Call();
-  size_t BodySize() const { return reader_.Body().size(); } ///< with kCall
-  /// The bytes of an answer to the request at hand, which is over with it.
+  size_t BodySize() const { return reader_.Body().size(); }         ///< with kCall
+  bool HeadOnly() const { return reader_.Head().method == "HEAD"; } ///< an answer has no body
+  /// The bytes of an answer to the request at hand, which is over with it; a file's own come behind them.
   /// @param[out] close  no further request may follow
   std::string Finish(const Answer &answer, bool stopping, bool &close);
   const Answer &Refusal() const { return refusal_; }
