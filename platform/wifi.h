@@ -50,7 +50,8 @@ public:
   /// @param[out] stations  array of objects: "mac" (lower case, colons) and, where known, "ip", "hostname",
   ///                       "signalstrength" (dBm), "transferRX" and "transferTX" (bytes that the station received
   ///                       and sent since it associated), "asso_time" (when it was last seen associated, local time as
-  ///                       "%T %Y/%m/%d"). An "ip" is always a well-formed address. Only stations that were let in.
+  ///                       "%T %Y/%m/%d"). An "ip" is always an IPv4 address, dotted decimal. Only stations that were
+  ///                       let in.
   /// @retval >=0  done
   /// @retval <0   no such network, or the daemon gives no whole list within 2 seconds
   int GetConnectionList(const std::string &network, Json::Value &stations);

@@ -12,10 +12,6 @@ namespace vornhost {
 
 namespace {
 
-bool IsLinkLocal(const Neighbour &entry) {
-  return entry.family == AF_INET6 && entry.ip.compare(0, 3, "fe8") >= 0 && entry.ip.compare(0, 3, "feb") <= 0;
-}
-
 auto OrderOf(const DhcpLease &lease) {
   constexpr auto kNever = std::numeric_limits<std::time_t>::max();
   return std::tuple(std::string_view(lease.mac), -(lease.expires == 0 ? kNever : lease.expires));
@@ -23,7 +19,7 @@ auto OrderOf(const DhcpLease &lease) {
 
 auto OrderOf(const Neighbour &entry) {
   const bool answered = (entry.state & (NUD_REACHABLE | NUD_DELAY | NUD_PROBE | NUD_PERMANENT)) != 0;
-  return std::tuple(std::string_view(entry.mac), entry.family == AF_INET6, !answered);
+  return std::tuple(std::string_view(entry.mac), !answered);
 }
 
 template <typename Entry> void SortByMac(std::vector<Entry> &entries) {
@@ -45,7 +41,7 @@ struct ByMac {
 StationFacts::StationFacts(const std::vector<DhcpLease> &leases, const std::vector<Neighbour> &neighbours)
     : leases_(leases) {
   std::copy_if(neighbours.begin(), neighbours.end(), std::back_inserter(neighbours_),
-               [](const Neighbour &entry) { return !IsLinkLocal(entry); });
+               [](const Neighbour &entry) { return entry.family == AF_INET; });
   SortByMac(leases_);
   SortByMac(neighbours_);
 }

@@ -16,17 +16,17 @@ public:
   StationFacts(const std::vector<DhcpLease> &leases, const std::vector<Neighbour> &neighbours);
 
   struct Facts {
-    std::string ip;       ///< a checked address; empty: not known
+    std::string ip;       ///< a checked IPv4 address, dotted decimal; empty: not known
     std::string hostname; ///< empty: not known
   };
   /// A device may have several leases (one in each network that it was in): the one whose address it uses counts, else
-  /// the one that lasts longest. Without a lease it is an IPv4 address of the neighbour table, and without that an IPv6
-  /// one that is not link-local, those that answered last before the others.
+  /// the one that lasts longest. Without a lease it is an IPv4 address of the neighbour table, one that answered
+  /// last before the others. A device that uses IPv6 alone has no address here.
   Facts Find(const std::string &mac) const;
 
 private:
   std::vector<DhcpLease> leases_;     // by MAC address; in it, the one that lasts longest first
-  std::vector<Neighbour> neighbours_; // by MAC address; in it, the best first
+  std::vector<Neighbour> neighbours_; // IPv4, by MAC address; in it, the best first
 };
 
 } // namespace vornhost

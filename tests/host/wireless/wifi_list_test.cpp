@@ -201,6 +201,14 @@ TEST_F(WifiList, FailedNeighboursAreNoAddresses) {
   EXPECT_EQ(Stations("wlan0").find("\"ip\""), std::string::npos);
 }
 
+TEST_F(WifiList, Ipv6NeighboursAreNoAddresses) {
+  WriteHostapdConfig("wlan0");
+  const FakeHostapd home("wlan0", WithStations({StationText(kPhone, true)}));
+  Shell("ip link add lbr0 type bridge && ip link set lbr0 up && ip addr add fd00::1/64 dev lbr0 && ip neigh add "
+        "fd00::7 lladdr 02:00:00:00:01:00 nud reachable dev lbr0");
+  EXPECT_EQ(Stations("wlan0").find("\"ip\""), std::string::npos);
+}
+
 TEST_F(WifiList, UnknownCommandIsNoList) {
   WriteHostapdConfig("wlan0");
   const FakeHostapd old("wlan0", [](const std::string &) { return "UNKNOWN COMMAND\n"; });
