@@ -22,7 +22,7 @@ constexpr unsigned kAllSources = (1U << kSourceCount) - 1;
 constexpr Source kPrecedence[] = {Source::kUpnp, Source::kMdns, Source::kNetbios,
                                   Source::kWifi, Source::kDhcp, Source::kArp};
 
-// Local time, "%T %Y/%m/%d".
+// Local time, "%T %Y/%m/%d". REQUIRES: tzset, in the same answer.
 std::string TimeText(int64_t wall) {
   const time_t time = wall;
   tm local{};
@@ -173,6 +173,7 @@ unsigned SourcesOf(const std::string &scannerType) {
 
 Json::Value RenderDevices(const StoredDevices &stored, const PresenceMap &presence, unsigned sources,
                           const Moment &now) {
+  tzset(); // localtime_r alone would keep the zone of the first call, also when the owner has chosen another since
   Json::Value list(Json::arrayValue);
   auto owned = stored.owner.begin(); // both are in the order of the MAC addresses
   const auto takeOwned = [&](const std::string *before) {

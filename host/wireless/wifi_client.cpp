@@ -86,6 +86,7 @@ std::string TimeText() {
   const std::time_t now = std::time(nullptr);
   std::tm local{};
   char text[32];
+  tzset(); // localtime_r alone would keep the zone of the first call, also when the owner has chosen another since
   localtime_r(&now, &local);
   return std::string(text, std::strftime(text, sizeof(text), "%T %Y/%m/%d", &local));
 }

@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -43,6 +44,13 @@ inline struct stat StatOf(const std::string &path) {
   struct stat info {};
   lstat(path.c_str(), &info);
   return info;
+}
+
+/// Makes a zone of tzdata the machine's, as its owner would under a running server.
+inline void PutTimeZone(const std::string &name) {
+  unsetenv("TZ");
+  std::filesystem::remove("/etc/localtime");
+  std::filesystem::create_symlink("/usr/share/zoneinfo/" + name, "/etc/localtime");
 }
 
 } // namespace hosttest

@@ -107,6 +107,16 @@ TEST_F(DeviceStoreTest, AFileThatIsNoStoreIsRefusedAndStays) {
   EXPECT_EQ(hosttest::ReadText(vornhost::kDeviceStore), text);
 }
 
+TEST_F(DeviceStoreTest, TimesFollowTheTimeZone) {
+  DeviceStore().Write({Laptop()}, {});
+  for (const auto &[zone, time] :
+       {std::pair("Asia/Tokyo", "07:13:20 2023/11/15"), std::pair("Asia/Kolkata", "03:43:20 2023/11/15"),
+        std::pair("UTC", "22:13:20 2023/11/14")}) {
+    hosttest::PutTimeZone(zone);
+    EXPECT_EQ(List()[0]["asso_time"], time) << zone;
+  }
+}
+
 TEST_F(DeviceStoreTest, AnotherVersionIsRefused) {
   { DeviceStore store; }
   vornhost::Database(vornhost::kDeviceStore).Execute("PRAGMA user_version = 2");

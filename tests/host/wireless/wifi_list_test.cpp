@@ -209,6 +209,21 @@ TEST_F(WifiList, Ipv6NeighboursAreNoAddresses) {
   EXPECT_EQ(Stations("wlan0").find("\"ip\""), std::string::npos);
 }
 
+TEST_F(WifiList, TimesFollowTheTimeZone) {
+  WriteHostapdConfig("wlan0");
+  const FakeHostapd home("wlan0", WithStations({StationText(kPhone, true)}));
+  for (const auto &[zone, east] : {std::pair("Asia/Tokyo", 540), std::pair("Asia/Kolkata", 330), std::pair("UTC", 0)}) {
+    hosttest::PutTimeZone(zone);
+    Json::Value stations;
+    const std::time_t before = std::time(nullptr);
+    ASSERT_GE(WifiClient().GetConnectionList("wlan0", stations), 0);
+    std::tm shown{};
+    strptime(stations[0]["asso_time"].asCString(), "%T %Y/%m/%d", &shown);
+    const std::time_t seen = timegm(&shown) - std::time_t{east} * 60;
+    EXPECT_TRUE(seen >= before && seen <= std::time(nullptr)) << zone << stations;
+  }
+}
+
 TEST_F(WifiList, UnknownCommandIsNoList) {
   WriteHostapdConfig("wlan0");
   const FakeHostapd old("wlan0", [](const std::string &) { return "UNKNOWN COMMAND\n"; });
