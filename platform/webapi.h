@@ -3,7 +3,7 @@
 // A module is a shared library with one plain C symbol, GetAPITable, that returns the address of a static table of
 // APIEntry rows ended by an all-zero row. The framework finds the row of (API name, version, method) for a request
 // and calls its handler on one of its own threads; handlers of different requests run at the same time. A handler
-// answers exactly once, by SetSuccess or SetError, before it returns.
+// answers, by SetSuccess or SetError, before it returns; of several answers the last counts.
 #ifndef PLATFORM_WEBAPI_H
 #define PLATFORM_WEBAPI_H
 

@@ -11,7 +11,7 @@ extern ROUTER_EXPORT VORN::APIEntry gTable[24];
 /// @return the first row of gTable; does no work and may be called any number of times, from any thread
 extern "C" ROUTER_EXPORT VORN::APIEntry *GetAPITable();
 
-// Handlers: each answers `response` exactly once, from `request`, and lets no exception out.
+// Handlers: each answers `response` from `request`; of several answers the last counts. None lets an exception out.
 ROUTER_EXPORT void GetConnectionList(VORN::APIRequest *request, VORN::APIResponse *response);
 ROUTER_EXPORT void SetConnectionListData(VORN::APIRequest *request, VORN::APIResponse *response);
 ROUTER_EXPORT void DelConnectionListData(VORN::APIRequest *request, VORN::APIResponse *response);

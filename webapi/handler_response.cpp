@@ -7,14 +7,12 @@ namespace vornwebapi {
 HandlerResponse::~HandlerResponse() = default;
 
 void HandlerResponse::Success(const Json::Value &data) {
-  ++answers_;
   text_ = R"({"success":true,"data":)";
   WriteJson(data, text_);
   text_ += '}';
 }
 
 void HandlerResponse::Error(int code, const Json::Value &data) {
-  ++answers_;
   text_ = R"({"success":false,"error":{"code":)" + std::to_string(code) + R"(,"data":)";
   WriteJson(data, text_);
   text_ += "}}";

@@ -22,15 +22,13 @@ public:
   void Error(int code, const Json::Value &data) override;
   void Callback(void (*function)(void *), void *data) override { callbacks_.Add(function, data); }
 
-  /// How often it was answered; once is right.
-  int Answers() const { return answers_; }
-  /// The body of the last answer; empty when there was none.
+  bool IsAnswered() const { return !text_.empty(); }
+  /// The body of the last answer, which takes the place of those before it; empty when there was none.
   std::string TakeText() { return std::move(text_); }
   Callbacks TakeCallbacks() { return std::move(callbacks_); }
 
 private:
   std::string text_;
-  int answers_ = 0;
   Callbacks callbacks_;
 };
 

@@ -14,7 +14,7 @@ namespace vornwebapi {
 /// drown another or fill the disk: 10 lines in 10 seconds, then how many were left out.
 enum class LogKind {
   kLifecycle,       ///< start, stop; never held back
-  kModuleFault,     ///< the module threw, answered nothing or more than once
+  kModuleFault,     ///< the module threw or answered nothing
   kConnectionLimit, ///< connections in all or from one address
   kDescriptorLimit, ///< the process or the system has no descriptors left
   kSlowClient,      ///< a deadline was reached

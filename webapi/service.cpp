@@ -28,12 +28,9 @@ bool RunHandler(const Route &route, VORN::APIRequest &request, VORN::APIResponse
 }
 
 Answer AnswerOf(const Route &route, HandlerResponse &response) {
-  if (response.Answers() == 0) {
+  if (!response.IsAnswered()) {
     Log(LogKind::kModuleFault, "%s answered nothing", route.name.c_str());
     return HandlerFailed();
-  }
-  if (response.Answers() > 1) {
-    Log(LogKind::kModuleFault, "%s answered %d times; the last counts", route.name.c_str(), response.Answers());
   }
   return Answered(response.TakeText());
 }

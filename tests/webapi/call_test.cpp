@@ -62,7 +62,9 @@ TEST_F(CallTest, ASilentHandlerIsAnsweredForAndLogged) {
 
 TEST_F(CallTest, OfTwoAnswersTheLastCounts) {
   EXPECT_EQ(Call("VORN.Test.Twice/1/get").body, R"({"success":true,"data":"second"})");
-  EXPECT_TRUE(server_.LogShows("VORN.Test.Twice v1 get answered 2 times"));
+  ExpectRefusal(Call("VORN.Test.Silent/1/get"), 500);
+  EXPECT_TRUE(server_.LogShows("VORN.Test.Silent v1 get answered nothing")); // a fault; what came before it was none
+  EXPECT_FALSE(server_.LogShows("VORN.Test.Twice", std::chrono::milliseconds(0)));
 }
 
 TEST_F(CallTest, AFailingHandlerLeavesTheConnection) {
