@@ -446,7 +446,7 @@ void ConnectionList::UpdateHostName(Json::Value &result, VORN::APIResponse *resp
 }
 
 int ConnectionList::GetNetBIOSNameByIP(const std::string &ip, std::string &name) {
-  if (!router::IsWhole(ip)) {
+  if (!router::IsWhole(ip)) { // the command would end in the address, and ask another host
     return -1;
   }
   std::array<char, kBufferSize> command{};

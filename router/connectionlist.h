@@ -63,11 +63,12 @@ public:
   /// @param[in]     ip    an address: it becomes part of a command line, and whoever reports stations has checked it
   /// @param[in,out] name  left as it is when the host has none to tell
   /// @retval 0   asked
-  /// @retval -1  the command could not be started
+  /// @retval -1  the command could not be started, or the address holds a NUL
   int GetNetBIOSNameByIP(const std::string &ip, std::string &name);
 
   void WriteDataToFile(const Json::Value &result);
-  /// @param[in,out] result  left as it is when there is no file; otherwise what could be read of it
+  /// @param[in,out] result  what could be read of the file; left as it is when there is none, or one that is not read
+  ///                        (see router/namecache.h)
   void ReadDataFromFile(Json::Value &result);
 };
 

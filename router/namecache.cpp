@@ -18,6 +18,8 @@ namespace router {
 namespace {
 
 constexpr mode_t kMode = 0600; // who is in the network is its owner's affair
+// Others may have put the file there, and it must not fill the memory. A listing is far smaller: 1,024 neighbours (the
+// kernel's limit, gc_thresh3) with names of 1,022 characters, each of them written with six, have 7 MB.
 constexpr off_t kSizeLimit = off_t{64} << 20;
 
 class File {

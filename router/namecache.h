@@ -13,8 +13,10 @@ inline constexpr char kNameCache[] = "/tmp/connectionlist.txt";
 /// @return false when the file cannot be opened, or is none (a link, a pipe)
 bool WriteNameCache(const Json::Value &listing);
 
-/// @param[out] listing  what the file holds; of a broken one, what the reader made of it
-/// @return false when there is no file, or its text is no JSON or nested too deeply
+/// @param[in,out] listing  what the file holds; of a text that is no JSON, what the reader made of it. Left as it is
+///                         when there is no file, and when the text is not given to the reader: of more than 64 MiB,
+///                         with a NUL in it, or nested more than 64 deep
+/// @return false when there is no file, or its text is no JSON or was not given to the reader
 bool ReadNameCache(Json::Value &listing);
 
 } // namespace router
