@@ -139,6 +139,16 @@ TEST_F(ArpTableTest, Load_ReadsALongTableWhole) {
   EXPECT_EQ(stations[3999]["ip"].asString(), "10.0.15.249");
 }
 
+TEST_F(ArpTableTest, NeighbourOfAnotherSubnetIsNotListedButRefreshed) {
+  PutNeighbours(kNeighbourTitle + NeighbourLine("203.0.113.9", kMac, "br0"));
+  EXPECT_EQ(Load(), "[]");
+  Get().calls.clear();
+  EXPECT_TRUE(ConnectionList().UpdateArpTable());
+  EXPECT_THAT(Get().calls,
+              ElementsAreArray(scripted::Join({{"GetTopologyString()"}, RefreshCalls("203.0.113.9", "-Ilbr0")})));
+  EXPECT_THAT(Get().log, IsEmpty());
+}
+
 TEST_F(ArpTableTest, Check_NeedsAddressMacAndInterface) {
   for (const char *record :
        {R"({"ip":"192.168.1.5","mac":"m"})", R"({"ip":"192.168.1.5","netif":"br0"})", R"({"mac":"m","netif":"br0"})",
@@ -153,6 +163,8 @@ TEST_F(ArpTableTest, Check_NeedsAddressMacAndInterface) {
 
 TEST_F(ArpTableTest, Check_InterfaceWithoutInformationIsNoBridge) {
   const Json::Value record = Parse(R"({"ip":"192.168.1.5","mac":"m","netif":"br0"})");
+  EXPECT_TRUE(ConnectionList().CheckArpObject(record));
+  Get().results["VORNNetIFGetInfo(br0, 0)"] = 2; // whatever it counts, there is some
   EXPECT_TRUE(ConnectionList().CheckArpObject(record));
   for (const int result : {0, -1}) {
     Get().calls.clear();
@@ -199,10 +211,21 @@ TEST_F(ArpTableTest, Refresh_FailedCommandsAreLoggedAndTheRestGoesOn) {
                                      "connectionlist: failed to ping (192.168.1.6)"));
 }
 
-TEST_F(ArpTableTest, Refresh_PositiveResultIsNoFailure) {
-  PutNeighbours(NeighbourLine("192.168.1.5", kMac, "lbr0"));
-  Get().results[RefreshCalls("192.168.1.5", "-Ilbr0")[0]] = 1;
+TEST_F(ArpTableTest, Refresh_AddressTwiceInTheTableIsRefreshedTwice) {
+  const std::string line = NeighbourLine("192.168.1.5", kMac, "lbr0");
+  PutNeighbours(line + line);
   EXPECT_TRUE(ConnectionList().UpdateArpTable());
+  const Lines once = RefreshCalls("192.168.1.5", "-Ilbr0");
+  EXPECT_THAT(Get().calls, ElementsAreArray(scripted::Join({{"GetTopologyString()"}, once, once})));
+}
+
+TEST_F(ArpTableTest, Refresh_PositiveResultsAreNoFailure) {
+  PutNeighbours(NeighbourLine("192.168.1.5", kMac, "lbr0"));
+  const Lines refresh = RefreshCalls("192.168.1.5", "-Ilbr0");
+  Get().topologyResult = 1;
+  Get().results = {{refresh[0], 1}, {refresh[1], 1}};
+  EXPECT_TRUE(ConnectionList().UpdateArpTable());
+  EXPECT_THAT(Get().calls, ElementsAreArray(scripted::Join({{"GetTopologyString()"}, refresh})));
   EXPECT_THAT(Get().log, IsEmpty());
 }
 

@@ -76,6 +76,17 @@ TEST_F(MappingTest, CopiedMembersKeepTheirJsonType) {
   EXPECT_THAT(Get().log, ElementsAre("clhandler: cannot parse time string ()"));
 }
 
+TEST_F(MappingTest, AssoTimeThatIsNoTextIsCopiedAndReadAsAnEmptyOne) {
+  for (const char *time : {"5", "null", "true", R"(["12:00:00 2099/01/01"])", "{}"}) {
+    Get().log.clear();
+    Json::Value entry = Parse(R"({"displayName":"x"})");
+    entry["asso_time"] = Parse(time);
+    const Json::Value record = Map(entry);
+    EXPECT_EQ(Text(record["asso_time"]) + Text(record["status"]), time + std::string("false"));
+    EXPECT_THAT(Get().log, ElementsAre("clhandler: cannot parse time string ()")) << time;
+  }
+}
+
 TEST_F(MappingTest, WirelessStationThatIsOnlineHasTransferKeys) {
   Json::Value entry = Parse(R"({"connection":"wifi","displayName":"phone"})");
   entry["asso_time"] = Ago(30);
@@ -260,6 +271,14 @@ TEST_F(OnlineTest, TextThatIsNoTimeIsLoggedAndOffline) {
     EXPECT_FALSE(IsOnline(text)) << text;
     EXPECT_THAT(Get().log, ElementsAre("clhandler: cannot parse time string (" + text + ")"));
   }
+}
+
+// Neither a text that ends early nor one that goes on is looked at: what was read of it is the time.
+TEST_F(OnlineTest, HowTheTextEndsMakesNoDifference) {
+  EXPECT_TRUE(IsOnline("12:00:00 2099/"));
+  EXPECT_FALSE(IsOnline("12:00:00 2020/01"));
+  EXPECT_TRUE(IsOnline(Ago(0) + " x"));
+  EXPECT_THAT(Get().log, IsEmpty());
 }
 
 TEST_F(OnlineTest, DaylightSavingTimeDoesNotKeepADeviceOnlineForAnHour) {

@@ -84,6 +84,13 @@ TEST_F(MergeTest, AddressBecomesAText) {
             R"([{"ip":"5","mac":"aa:bb:cc:dd:ee:01"}])");
 }
 
+TEST_F(MergeTest, AddressThatIsNullIsAnEmptyOne) {
+  const std::string wired = R"({"ip":null,"mac":"aa:bb:cc:dd:ee:01","netif":"br0"})";
+  EXPECT_EQ(Merge("[]", "[" + wired + "]"), "[" + wired + "]");
+  EXPECT_EQ(Merge(R"([{"ip":"old","mac":"aa:bb:cc:dd:ee:01"}])", "[" + wired + "]"),
+            R"([{"ip":"","mac":"aa:bb:cc:dd:ee:01"}])");
+}
+
 TEST_F(MergeTest, NothingWiredChangesNothing) {
   for (const char *wired : {"[]", "null", "{}"}) {
     for (const char *stations : {R"([{"mac":"x"}])", "null", "\"no array\""}) {

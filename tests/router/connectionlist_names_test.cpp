@@ -124,6 +124,28 @@ TEST_F(NamesTest, File_MissingFileLeavesTheResultAndSaysNothing) {
   EXPECT_THAT(Get().log, IsEmpty());
 }
 
+TEST_F(NamesTest, File_BrokenFileLeavesWhatTheReaderMadeOfIt) {
+  PutNameFile(R"({"stations":[{"ip":"1"}])");
+  Json::Value read;
+  ConnectionList().ReadDataFromFile(read);
+  EXPECT_EQ(Text(read), R"({"stations":[{"ip":"1"}]})");
+  EXPECT_THAT(Get().log, IsEmpty());
+}
+
+TEST_F(NamesTest, File_TextThatTheReaderNeverSeesLeavesTheResult) {
+  const std::string listing = R"({"stations":[{"ip":"1"}]})";
+  PutNameFile(std::string(65, '[') + std::string(65, ']'));
+  Json::Value read = Parse(listing);
+  ConnectionList().ReadDataFromFile(read);
+  EXPECT_EQ(Text(read), listing);
+  PutNameFile(std::string("[1]\0", 4));
+  ConnectionList().ReadDataFromFile(read);
+  EXPECT_EQ(Text(read), listing);
+  PutNameFile("[1]" + std::string(64 << 20, ' '));
+  ConnectionList().ReadDataFromFile(read);
+  EXPECT_EQ(Text(read), listing);
+}
+
 TEST_F(NamesTest, File_ThatCannotBeOpenedIsLogged) {
   fs::create_directory(kNameFile);
   ConnectionList().WriteDataToFile(Json::Value());
@@ -262,6 +284,11 @@ TEST_F(NamesTest, NetBios_RunsThePipelineAndTakesTheUniqueName) {
   EXPECT_EQ(NameOf("192.168.1.5", "old"), "LAPTOP");
   EXPECT_THAT(commands, ElementsAre("r " + CommandFor("192.168.1.5")));
   EXPECT_THAT(TakeNmblookupCalls(), ElementsAre("-A|192.168.1.5"));
+}
+
+TEST_F(NamesTest, NetBios_NameOfOneLetterIsOne) {
+  PutNetBiosReply("1", "\tX <00> - B <ACTIVE>\n");
+  EXPECT_EQ(NameOf("1", "old"), "X");
 }
 
 TEST_F(NamesTest, NetBios_DifferentNamesAreJoinedWithBlanks) {

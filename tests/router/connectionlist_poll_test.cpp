@@ -74,6 +74,17 @@ TEST_F(PollTest, Get_FirstStartsATaskAndAnswersTheStartReply) {
   EXPECT_THAT(Get().log, IsEmpty());
 }
 
+TEST_F(PollTest, Start_TheTaskGetsTheObjectThatStartedIt) {
+  ConnectionList list; // the task gets its address, whatever it is good for
+  static ConnectionList *object = nullptr;
+  object = &list;
+  Exchange exchange;
+  exchange.Run([](VORN::APIRequest *request, VORN::APIResponse *response) { object->PollStart(request, response); });
+  EXPECT_THAT(Get().calls, ElementsAre(kStart, R"(SetSuccess({"finish":false,"id":"connectionlist_1"}))"));
+  EXPECT_EQ(Get().startedTask, &ConnectionList::WrapperFunc);
+  EXPECT_EQ(Get().startedContext, &list);
+}
+
 TEST_F(PollTest, Get_ScannerTypeThatIsNoTextGoesToPolling) {
   for (const char *wrong : {"1", "null", "[]", "[\"all\"]", "{}", "true"}) {
     Get().calls.clear();
@@ -193,6 +204,19 @@ TEST_F(PollTest, Task_EmptyNetworkAnswersTheEmptyListThrice) {
   const std::string empty = R"(SetSuccess({"stations":[]}))";
   EXPECT_THAT(RunTask(), ElementsAre(empty, empty, empty));
   EXPECT_EQ(scripted::ReadNameFile(), "{\n\t\"stations\" : []\n}\n");
+  EXPECT_THAT(Get().log, IsEmpty());
+}
+
+TEST_F(PollTest, Task_WithoutTheWirelessDaemonListsTheWiredStations) {
+  Get().serverReady = false;
+  const auto wired = [](const std::string &last) {
+    return R"({"connection":"ethernet","hostname":"","ip":"192.168.1.)" + last + R"(","mac":"aa:bb:cc:dd:ee:0)" +
+           (last == "5" ? "1" : "2") + R"(","netif":"lbr0"})";
+  };
+  const std::string listed = R"({"stations":[)" + wired("5") + "," + wired("6") + "]}";
+  const std::string answer = "SetSuccess(" + listed + ")";
+  EXPECT_THAT(RunTask(), ElementsAre(answer, answer, answer, answer));
+  EXPECT_EQ(Text(Parse(scripted::ReadNameFile())), listed);
   EXPECT_THAT(Get().log, IsEmpty());
 }
 

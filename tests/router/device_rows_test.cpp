@@ -54,6 +54,12 @@ protected:
     }
     return out;
   }
+  // Of the list that an answer holds.
+  static std::string NamesAnswered(const std::string &answer) {
+    const std::string begin = "SetSuccess(";
+    EXPECT_EQ(answer.rfind(begin, 0), 0U) << answer;
+    return Names(Parse(answer.substr(begin.size(), answer.size() - begin.size() - 1)));
+  }
   static std::string Listed(const std::string &netRange) {
     Json::Value result;
     EXPECT_EQ(ConnectionListHandler().GetList("all", netRange, result), 0);
@@ -85,6 +91,24 @@ TEST_F(RangeTest, CountsOnlineStationsOfTheRange) {
     EXPECT_EQ(Counted(unknown), 0U) << unknown;
   }
   EXPECT_THAT(Get().log, IsEmpty());
+}
+
+TEST_F(RangeTest, SmallGAnywhereInTheInterfaceIsGuestAndACapitalOneIsNot) {
+  Add("h", "brg0", "", 0);
+  Add("i", "GBR0", "", 0);
+  EXPECT_EQ(Listed("guest"), "deh");
+  EXPECT_EQ(Listed("local"), "abfgi");
+  EXPECT_EQ(Counted("guest"), 2U);
+  EXPECT_EQ(Counted("local"), 4U);
+}
+
+TEST_F(RangeTest, OldStationsOfTheResultAreReplaced) {
+  for (const auto &[range, listed] : {std::pair("all", R"([{"netif":"br0"},{"netif":"gbr0"}])"),
+                                      std::pair("guest", R"([{"netif":"gbr0"}])"), std::pair("other", "[]")}) {
+    Json::Value result = Parse(R"({"kept":1,"stations":["old"]})");
+    ConnectionListHandler().FilterNetRange(Parse(R"({"stations":[{"netif":"br0"},{"netif":"gbr0"}]})"), range, result);
+    EXPECT_EQ(Text(result), R"({"kept":1,"stations":)" + std::string(listed) + "}") << range;
+  }
 }
 
 TEST_F(RangeTest, Count_AsksTheBridgesOnceAndTheSubnetsOfLocalStationsOnly) {
@@ -160,6 +184,15 @@ TEST_F(RangeTest, Bridges_EachCallAppendsThemAgain) {
   EXPECT_FALSE(handler.IsMatchAnyBridge(std::string("10.9.9.9\0x", 10)));
 }
 
+TEST_F(RangeTest, Bridges_LbrAloneIsOne) {
+  Get().lans = {{"lbr0", "192.168.1.1", "255.255.255.0"}};
+  ConnectionListHandler handler;
+  EXPECT_EQ(handler.GetAllBridgeIP(), 0);
+  EXPECT_TRUE(handler.IsMatchAnyBridge("192.168.1.5"));
+  EXPECT_FALSE(handler.IsMatchAnyBridge("203.0.113.9"));
+  EXPECT_EQ(Listed("local"), "ab");
+}
+
 TEST_F(RangeTest, Bridges_OnlyTheResult1IsAMatch) {
   ConnectionListHandler handler;
   handler.GetAllBridgeIP();
@@ -221,6 +254,15 @@ TEST_F(RangeTest, GetCount_DaemonThatFailsAnswers4300WithNull) {
               ElementsAre("clhandler: failed to get upnp data", "clhandler: failed to get scanner data for counting"));
 }
 
+TEST_F(RangeTest, GetCount_DeviceListThatIsNoArrayAnswers4300WithNull) {
+  Get().deviceList["ClientList"] = Parse(R"({"a":1})");
+  Exchange exchange;
+  exchange.Run(GetConnectionListCount);
+  EXPECT_THAT(exchange.Answers(), ElementsAre("SetError(4300, null)"));
+  EXPECT_THAT(Get().log, ElementsAre("clhandler: input should be array", "clhandler: failed on mapping json value",
+                                     "clhandler: failed to get scanner data for counting"));
+}
+
 TEST_F(RangeTest, Get_WithAScannerTypeAnswersAtOnce) {
   Get().deviceList = Parse(R"({"ClientList":[{"displayName":"x","asso_time":"12:00:00 2020/01/01"}]})");
   Exchange exchange(Parse(R"({"scannertype":"arp"})"));
@@ -240,11 +282,23 @@ TEST_F(RangeTest, Get_NetRangeIsUsedWhenItIsAText) {
         std::pair("[\"guest\"]", "abcdefg"), std::pair("\"GUEST\"", "")}) {
     Exchange exchange(Parse(std::string(R"({"scannertype":"all","netrange":)") + range + "}"));
     exchange.Run(GetConnectionList);
-    const std::string &answer = exchange.Answer();
-    const std::string begin = "SetSuccess(";
-    ASSERT_EQ(answer.rfind(begin, 0), 0U) << answer;
-    EXPECT_EQ(Names(Parse(answer.substr(begin.size(), answer.size() - begin.size() - 1))), names) << range;
+    EXPECT_EQ(NamesAnswered(exchange.Answer()), names) << range;
   }
+}
+
+TEST_F(RangeTest, Get_WithoutANetRangeListsAll) {
+  Exchange exchange(Parse(R"({"scannertype":"all"})"));
+  exchange.Run(GetConnectionList);
+  EXPECT_EQ(NamesAnswered(exchange.Answer()), "abcdefg");
+}
+
+TEST_F(RangeTest, Get_DeviceListThatIsNoArrayAnswers4300WithNull) {
+  Get().deviceList["ClientList"] = Parse(R"({"a":1})");
+  Exchange exchange(Parse(R"({"scannertype":"all"})"));
+  exchange.Run(GetConnectionList);
+  EXPECT_THAT(exchange.Answers(), ElementsAre("SetError(4300, null)"));
+  EXPECT_THAT(Get().log, ElementsAre("clhandler: input should be array", "clhandler: failed on mapping json value",
+                                     "clhandler: failed to get scanner (all) data"));
 }
 
 TEST_F(RangeTest, Get_DaemonThatFailsAnswers4300WithNull) {
@@ -340,11 +394,14 @@ TEST_F(EditTest, Delete_MissingOrWrongParameterAnswers4302) {
 }
 
 TEST_F(EditTest, Delete_UnknownDeviceAnswers4300WithNull) {
-  Get().results["DelDeviceListData(x)"] = 1;
-  Exchange exchange(Parse(R"({"mac":"x"})"));
-  exchange.Run(DelConnectionListData);
-  EXPECT_THAT(exchange.Answers(), ElementsAre("SetError(4300, null)"));
-  EXPECT_THAT(Get().log, ElementsAre("clhandler: failed to del device (x)"));
+  for (const int failure : {-1, 1}) {
+    scripted::Reset();
+    Get().results["DelDeviceListData(x)"] = failure;
+    Exchange exchange(Parse(R"({"mac":"x"})"));
+    exchange.Run(DelConnectionListData);
+    EXPECT_THAT(exchange.Answers(), ElementsAre("SetError(4300, null)"));
+    EXPECT_THAT(Get().log, ElementsAre("clhandler: failed to del device (x)"));
+  }
 }
 
 } // namespace

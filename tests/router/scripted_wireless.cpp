@@ -5,13 +5,14 @@
 namespace scripted {
 namespace {
 
-int Find(const std::map<std::string, Json::Value> &values, const std::string &name, Json::Value &out) {
+// @return `result`; negative, too, when there is no such value
+int Find(int result, const std::map<std::string, Json::Value> &values, const std::string &name, Json::Value &out) {
   const auto found = values.find(name);
-  if (found == values.end()) {
+  if (result < 0 || found == values.end()) {
     return -1;
   }
   out = found->second;
-  return 0;
+  return result;
 }
 
 } // namespace
@@ -33,7 +34,7 @@ int WifiClient::GetAdapterList(Json::Value &adapters) {
 
 int WifiClient::GetAdapterConfig(const std::string &adapter, Json::Value &config) {
   const int result = Call("GetAdapterConfig(" + adapter + ", " + Text(config) + ")");
-  return result < 0 ? result : scripted::Find(Get().adapterConfigs, adapter, config);
+  return scripted::Find(result, Get().adapterConfigs, adapter, config);
 }
 
 int WifiClient::ApplyAdapter(const std::string &adapter, const Json::Value &config) {
@@ -45,7 +46,7 @@ int WifiClient::ApplyAdapter(const std::string &adapter, const Json::Value &conf
 
 int WifiClient::GetConnectionList(const std::string &network, Json::Value &stations) {
   const int result = Call("GetConnectionList(" + network + ", " + Text(stations) + ")");
-  return result < 0 ? result : scripted::Find(Get().wifiStations, network, stations);
+  return scripted::Find(result, Get().wifiStations, network, stations);
 }
 
 } // namespace vornwireless::dbus

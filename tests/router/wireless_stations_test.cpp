@@ -99,6 +99,24 @@ TEST_F(WirelessStationsTest, NetworkThatCannotBeAskedIsLoggedByItsAdapter) {
                                      "connectionlist: Failed to get connection list for [wlan0]"));
 }
 
+TEST_F(WirelessStationsTest, PositiveResultsAreNoFailure) {
+  Get().adapters = Parse(R"(["wlan0"])");
+  Get().results = {{"GetAdapterList(null)", 1},
+                   {"GetAdapterConfig(wlan0, null)", 1},
+                   {"GetConnectionList(wlan0, null)", 1},
+                   {"GetConnectionList(gwlan0, null)", 1}};
+  EXPECT_EQ(Load(), "[" + Filled("wlan0") + "," + Filled("gwlan0") + "]");
+  EXPECT_THAT(Get().log, IsEmpty());
+}
+
+TEST_F(WirelessStationsTest, ListThatIsNoArrayFails) {
+  Get().adapters = Json::Value(Json::arrayValue);
+  Json::Value stations("no array");
+  EXPECT_FALSE(Load(stations));
+  EXPECT_EQ(Text(stations), "\"no array\"");
+  EXPECT_THAT(Get().log, ElementsAre(kNotLists, "connectionlist: failed to assign detail info"));
+}
+
 TEST_F(WirelessStationsTest, StationsAreKeptWholeButForFiveKeys) {
   Get().adapters = Parse(R"(["wlan0"])");
   Get().adapterConfigs["wlan0"] = Parse(R"({"enabled":true})");
