@@ -12,7 +12,9 @@
 #include <optional>
 #include <string_view>
 #include <tuple>
+#include <unordered_map>
 #include <utility>
+#include <vector>
 
 using vornnetwork::dbus::NetClient;
 namespace station = router::station;
@@ -28,29 +30,59 @@ const Json::StaticString kMacAddr("macAddr");
 const Json::StaticString kUserName("userdef_displayName");
 const Json::StaticString kUserType("userdef_deviceType");
 const Json::StaticString kDeviceCount("devicecount");
+const Json::StaticString kNameless("Network Device");
 
-// A member of an entry that becomes one of the record as it stands, of whatever type.
-struct Copied {
-  const char *entryKey;
-  const Json::StaticString &recordKey;
+// What a record is made of: the members of an entry that are read, and what is found out from them.
+enum Part : size_t {
+  kPartAssoTime,
+  kPartConnection,
+  kPartDeviceType,
+  kPartDisplayName,
+  kPartIpAddr,
+  kPartMacAddr,
+  kPartManufacturer,
+  kPartModelName,
+  kPartNetif,
+  kPartSignalStrength,
+  kPartTransferRx,
+  kPartTransferTx,
+  kPartUserType,
+  kPartUserName,
+  kEntryPartCount,
+  kPartStatus = kEntryPartCount,
+  kPartHostname,
+  kPartType,
+  kPartCount
+};
+using Parts = std::array<Json::Value *, kPartCount>; // null: absent
+
+// In the order in which an entry has them, that of their bytes.
+constexpr std::array<std::string_view, kEntryPartCount> kEntryKeys = {
+    "asso_time",          "connection",         "deviceType", "displayName",    "ipAddr",     "macAddr",
+    "manufacturer",       "modelName",          "netif",      "signalstrength", "transferRX", "transferTX",
+    "userdef_deviceType", "userdef_displayName"};
+
+struct Field {
+  const Json::StaticString &key;
+  Part part;
   Json::Value absent;
+  bool ofStations; // only of a wireless station that is online
 };
 
-const std::array<Copied, 7> kCopied = {{
-    {"macAddr", station::kMac, station::kNone},
-    {"asso_time", station::kAssoTime, station::kNone},
-    {"ipAddr", station::kIp, station::kNone},
-    {"manufacturer", station::kBrand, station::kNone},
-    {"modelName", station::kModel, station::kNone},
-    {"connection", station::kConnection, station::kEthernet},
-    {"netif", station::kNetif, station::kNone},
-}};
-
-// Only of a wireless station that is online.
-const std::array<Copied, 3> kCopiedOnline = {{
-    {"transferRX", station::kTransferRx, station::kNone},
-    {"transferTX", station::kTransferTx, station::kNone},
-    {"signalstrength", station::kSignalStrength, 0},
+const std::array<Field, 13> kFields = {{
+    {station::kMac, kPartMacAddr, station::kNone, false},
+    {station::kAssoTime, kPartAssoTime, station::kNone, false},
+    {station::kIp, kPartIpAddr, station::kNone, false},
+    {station::kHostname, kPartHostname, station::kNone, false},
+    {station::kStatus, kPartStatus, false, false},
+    {station::kType, kPartType, station::kOthers, false},
+    {station::kBrand, kPartManufacturer, station::kNone, false},
+    {station::kModel, kPartModelName, station::kNone, false},
+    {station::kConnection, kPartConnection, station::kEthernet, false},
+    {station::kNetif, kPartNetif, station::kNone, false},
+    {station::kTransferRx, kPartTransferRx, station::kNone, true},
+    {station::kTransferTx, kPartTransferTx, station::kNone, true},
+    {station::kSignalStrength, kPartSignalStrength, 0, true},
 }};
 
 struct DeviceType {
@@ -69,20 +101,81 @@ constexpr DeviceType kDeviceTypes[] = {
     {DeviceType::kEquals, "computer", "computer"},
 };
 
-// What the entry has is taken out of it, not copied: the entry is read once.
-template <size_t count> void Take(Json::Value &entry, const std::array<Copied, count> &members, Json::Value &record) {
-  for (const Copied &member : members) {
-    Json::Value &value = record[member.recordKey];
-    if (!entry.isObject() || !entry.removeMember(member.entryKey, &value)) {
-      value = member.absent;
+// Goes once through the members of an entry and the known keys, which are in the same order: a search for each costs
+// more than all else that a record needs.
+Parts FindParts(Json::Value &entry) {
+  Parts parts{};
+  if (!entry.isObject()) {
+    return parts;
+  }
+  const auto *known = kEntryKeys.begin();
+  for (auto member = entry.begin(); member != entry.end(); ++member) {
+    const char *end = nullptr;
+    const char *begin = member.memberName(&end);
+    const std::string_view name(begin, static_cast<size_t>(end - begin));
+    known = std::find_if(known, kEntryKeys.end(), [name](std::string_view key) { return key >= name; });
+    if (known != kEntryKeys.end() && *known == name) {
+      parts[static_cast<size_t>(known - kEntryKeys.begin())] = &*member;
     }
   }
+  return parts;
 }
 
-// The first of two members that is a text; nothing when neither is.
-std::optional<std::string> FirstText(const Json::Value &entry, const char *first, const char *second) {
-  auto text = router::TextOf(router::MemberOf(entry, first));
-  return text ? text : router::TextOf(router::MemberOf(entry, second));
+// A record that says nothing yet. Copying it costs a fraction of setting member after member, and what a part has to
+// say is moved into its place.
+class BlankRecord {
+public:
+  explicit BlankRecord(bool ofStation) : blank_(Json::objectValue) {
+    for (const Field &field : kFields) {
+      if (ofStation || !field.ofStations) {
+        blank_[field.key] = field.absent;
+      }
+    }
+    for (const std::string &name : blank_.getMemberNames()) {
+      const auto *field =
+          std::find_if(kFields.begin(), kFields.end(), [&name](const Field &each) { return name == each.key.c_str(); });
+      order_.push_back(field->part);
+    }
+  }
+
+  Json::Value Fill(const Parts &parts) const {
+    Json::Value record(blank_);
+    auto member = record.begin();
+    for (const Part part : order_) {
+      if (parts[part] != nullptr) {
+        member->swap(*parts[part]);
+      }
+      ++member;
+    }
+    return record;
+  }
+
+private:
+  Json::Value blank_;
+  std::vector<Part> order_; // of its members
+};
+
+// The first of two members that is a text; null when neither is.
+template <class Value> Value *FirstText(Value *first, Value *second) {
+  const auto isText = [](const Value *value) { return value != nullptr && value->isString(); };
+  return isText(first) ? first : isText(second) ? second : nullptr;
+}
+
+void LogNameless() {
+  ROUTER_LOG("%s:%d warning: no display name found");
+}
+
+// @param[in] text  what the user or the scanners say; null: nothing
+Json::StaticString TypeOf(const Json::Value *text) {
+  const auto source = text == nullptr ? std::nullopt : router::ViewOf(*text);
+  if (!source) {
+    return station::kOthers;
+  }
+  const auto *known = std::find_if(std::begin(kDeviceTypes), std::end(kDeviceTypes), [&source](const DeviceType &each) {
+    return each.test == DeviceType::kContains ? source->find(each.text) != std::string_view::npos
+                                              : *source == each.text;
+  });
+  return known == std::end(kDeviceTypes) ? station::kOthers : Json::StaticString(known->type);
 }
 
 bool IsGuest(const Json::Value &record) {
@@ -135,9 +228,9 @@ public:
   // A text does not say whether it is daylight saving time, and in the hour that a clock change repeats both would do:
   // it is taken for what holds now, as the stamps that matter are a minute old.
   // @return negative when the text is no time
-  std::time_t Read(const std::string &text) const {
+  std::time_t Read(const char *text) const {
     std::tm parsed{}; // a text that does not match leaves it so: a time before 1970
-    strptime(text.c_str(), kTimeFormat, &parsed);
+    strptime(text, kTimeFormat, &parsed);
     std::tm asUtc = parsed;
     const std::time_t time = timegm(&asUtc) - fields_.tm_gmtoff;
     std::tm shown{};
@@ -150,19 +243,47 @@ public:
     return std::mktime(&parsed);
   }
 
-  bool IsOnline(const std::string &text) const {
-    const std::time_t then = Read(text);
+  // Many devices were last seen in the same second: a text that was read is not read again.
+  bool IsOnline(const std::string &text) {
+    const auto known = online_.find(text);
+    if (known != online_.end()) {
+      return known->second;
+    }
+    const std::time_t then = Read(text.c_str());
     if (then < 0) {
       ROUTER_LOG("%s:%d cannot parse time string (%s)", text.c_str());
       return false;
     }
-    return std::difftime(now_, then) <= kOnlineSeconds;
+    return online_[text] = std::difftime(now_, then) <= kOnlineSeconds;
   }
 
 private:
   std::time_t now_ = std::time(nullptr);
   std::tm fields_{};
+  std::unordered_map<std::string, bool> online_;
 };
+
+// The entry's members go into the record.
+Json::Value MakeRecord(Json::Value &entry, LocalClock &clock) {
+  static const BlankRecord kOfDevice(false);
+  static const BlankRecord kOfStation(true);
+  Parts parts = FindParts(entry);
+  Json::Value nameless(kNameless);
+  parts[kPartHostname] = FirstText(parts[kPartUserName], parts[kPartDisplayName]);
+  if (parts[kPartHostname] == nullptr) {
+    LogNameless();
+    parts[kPartHostname] = &nameless;
+  }
+  const Json::Value *seen = parts[kPartAssoTime];
+  const bool online = clock.IsOnline(seen == nullptr ? "" : router::TextOf(*seen).value_or(""));
+  Json::Value status(online);
+  parts[kPartStatus] = &status;
+  Json::Value type(TypeOf(FirstText(parts[kPartUserType], parts[kPartDeviceType])));
+  parts[kPartType] = &type;
+  const Json::Value *connection = parts[kPartConnection];
+  const bool isStation = online && connection != nullptr && router::ViewOf(*connection) == station::kWifi.c_str();
+  return (isStation ? kOfStation : kOfDevice).Fill(parts);
+}
 
 } // namespace
 
@@ -198,44 +319,25 @@ int ConnectionListHandler::ValueMapping(Json::Value entries, Json::Value &statio
     ROUTER_LOG("%s:%d input should be array");
     return -1;
   }
-  const LocalClock clock;
+  LocalClock clock;
   for (Json::Value &entry : entries) {
-    Json::Value record(Json::objectValue);
-    Take(entry, kCopied, record);
-    record[station::kHostname] = GetHostName(entry);
-    const bool online = clock.IsOnline(router::TextOf(record[station::kAssoTime]).value_or(""));
-    record[station::kStatus] = online;
-    record[station::kType] = GetDeviceType(entry);
-    if (online && router::MemberText(record, station::kConnection) == station::kWifi.c_str()) {
-      Take(entry, kCopiedOnline, record);
-    }
-    stations.append(std::move(record));
+    stations.append(MakeRecord(entry, clock));
+    entry = Json::Value(); // what is left of it makes room for the next record while it is at hand
   }
   return 0;
 }
 
 std::string ConnectionListHandler::GetHostName(const Json::Value &entry) {
-  auto name = FirstText(entry, kUserName, "displayName");
-  if (!name) {
-    ROUTER_LOG("%s:%d warning: no display name found");
-    return "Network Device";
+  const Json::Value *name = FirstText(&router::MemberOf(entry, kUserName), &router::MemberOf(entry, "displayName"));
+  if (name == nullptr) {
+    LogNameless();
+    return kNameless.c_str();
   }
-  return *std::move(name);
+  return name->asString();
 }
 
 std::string ConnectionListHandler::GetDeviceType(const Json::Value &entry) {
-  const auto source = FirstText(entry, kUserType, "deviceType");
-  if (!source) {
-    return station::kOthers.c_str();
-  }
-  for (const DeviceType &known : kDeviceTypes) {
-    const bool holds =
-        known.test == DeviceType::kContains ? source->find(known.text) != std::string::npos : *source == known.text;
-    if (holds) {
-      return known.type;
-    }
-  }
-  return station::kOthers.c_str();
+  return TypeOf(FirstText(&router::MemberOf(entry, kUserType), &router::MemberOf(entry, "deviceType"))).c_str();
 }
 
 bool ConnectionListHandler::IsOnline(const std::string &assoTime) {

@@ -22,6 +22,7 @@
 
 using router::MemberOf;
 using router::MemberText;
+using router::ViewOf;
 using vornwireless::dbus::WifiClient;
 namespace station = router::station;
 
@@ -138,15 +139,6 @@ bool IsNoName(const std::string &name) {
   return name.empty() || name == "?";
 }
 
-std::optional<std::string_view> ViewOf(const Json::Value &value) {
-  const char *begin = nullptr;
-  const char *end = nullptr;
-  if (!value.getString(&begin, &end)) {
-    return std::nullopt;
-  }
-  return std::string_view(begin, static_cast<size_t>(end - begin));
-}
-
 // The first record of each MAC address, which is the one that a search from the start would find. Only texts are in it:
 // what a number reads as is no MAC address. It looks into the records, which may change but for their "mac".
 class MacIndex {
@@ -163,11 +155,8 @@ public:
       byMac_.try_emplace(*mac, &record);
     }
   }
-  /// @return null when there is none
-  Json::Value *Find(std::string_view mac) const {
-    const auto found = byMac_.find(mac);
-    return found == byMac_.end() ? nullptr : found->second;
-  }
+  /// @return the record of that address; null, to be set, when there is none. `mac` belongs to the record that will be.
+  Json::Value *&At(std::string_view mac) { return byMac_[mac]; }
 
 private:
   std::unordered_map<std::string_view, Json::Value *> byMac_;
@@ -390,8 +379,9 @@ bool ConnectionList::CombineJsonData(Json::Value &stations, Json::Value &arpStat
     if (!mac) {
       continue;
     }
-    if (Json::Value *known = byMac.Find(*mac); known == nullptr) {
-      byMac.Add(stations.append(std::move(wired)));
+    Json::Value *&known = byMac.At(*mac);
+    if (known == nullptr) {
+      known = &stations.append(std::move(wired)); // its texts stay where they are
     } else if (MemberText(wired, station::kNetif).find("br") != std::string::npos) {
       (*known)[station::kIp] = MemberText(wired, station::kIp);
     }

@@ -56,6 +56,15 @@ std::optional<std::string> TextOf(const Json::Value &value) {
   return value.asString();
 }
 
+std::optional<std::string_view> ViewOf(const Json::Value &value) {
+  const char *begin = nullptr;
+  const char *end = nullptr;
+  if (!value.getString(&begin, &end)) {
+    return std::nullopt;
+  }
+  return std::string_view(begin, static_cast<size_t>(end - begin));
+}
+
 bool IsWhole(const std::string &text) {
   return text.find('\0') == std::string::npos;
 }

@@ -7,6 +7,7 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 
 namespace router {
 
@@ -19,6 +20,9 @@ enum ErrorCode {
 
 /// @return the value's text, untouched; nothing when it is no text
 std::optional<std::string> TextOf(const Json::Value &value);
+
+/// The same without a copy: what the value holds, as long as it holds it.
+std::optional<std::string_view> ViewOf(const Json::Value &value);
 
 /// @return whether a C function would read the text to its end: a NUL in it would cut it
 bool IsWhole(const std::string &text);

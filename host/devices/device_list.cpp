@@ -8,6 +8,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdlib>
 #include <ctime>
 #include <mutex>
 #include <optional>
@@ -16,6 +17,7 @@ namespace vornhost {
 
 namespace {
 
+constexpr char kTimeZoneFile[] = "/etc/localtime";
 constexpr unsigned kAllSources = (1U << kSourceCount) - 1;
 
 // Whose name is the best: one that a person gave comes before one that a machine made up.
@@ -161,6 +163,50 @@ private:
   std::shared_ptr<const PresenceMap> presence_;
 };
 
+// What a list was made of.
+struct Ingredients {
+  std::shared_ptr<const StoredDevices> stored;
+  std::shared_ptr<const PresenceMap> presence;
+  FileMark timeZone;
+
+  bool operator==(const Ingredients &) const = default;
+};
+
+// By the difference of the two clocks, a list says when a device was seen: it holds until one of them is set. That they
+// are read one after the other moves the difference a little.
+class ListKeeper {
+public:
+  std::shared_ptr<const Json::Value> Get(unsigned sources, const Ingredients &of) {
+    const Moment now{WallMillis() / 1000, BootMillis()};
+    const int64_t bootedAt = WallMillis() - now.boot;
+    const std::lock_guard lock(mutex_);
+    if (of != of_ || std::abs(bootedAt - bootedAt_) > kClockTolerance) {
+      lists_.clear();
+      of_ = of;
+      bootedAt_ = bootedAt;
+    }
+    std::shared_ptr<const Json::Value> &list = lists_[sources];
+    if (!list) {
+      list = std::make_shared<const Json::Value>(RenderDevices(*of.stored, *of.presence, sources, now));
+    }
+    return list;
+  }
+
+private:
+  static constexpr int64_t kClockTolerance = 500; // milliseconds
+
+  static int64_t WallMillis() {
+    timespec time{};
+    clock_gettime(CLOCK_REALTIME, &time);
+    return int64_t{time.tv_sec} * 1000 + time.tv_nsec / 1000000;
+  }
+
+  std::mutex mutex_;
+  Ingredients of_;
+  int64_t bootedAt_ = 0;
+  std::map<unsigned, std::shared_ptr<const Json::Value>> lists_;
+};
+
 } // namespace
 
 unsigned SourcesOf(const std::string &scannerType) {
@@ -202,9 +248,10 @@ std::shared_ptr<const StoredDevices> CurrentDevices() {
   return reader.Get();
 }
 
-std::shared_ptr<const PresenceMap> CurrentPresence() {
-  static PresenceReader reader;
-  return reader.Get();
+std::shared_ptr<const Json::Value> CurrentList(unsigned sources) {
+  static PresenceReader presence;
+  static ListKeeper keeper;
+  return keeper.Get(sources, {CurrentDevices(), presence.Get(), MarkOf(kTimeZoneFile)});
 }
 
 } // namespace vornhost

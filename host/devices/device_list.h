@@ -38,8 +38,10 @@ Json::Value RenderDevices(const StoredDevices &stored, const PresenceMap &presen
 /// @throws DatabaseError
 std::shared_ptr<const StoredDevices> CurrentDevices();
 
-/// What is now in the presence file, empty when there is none; likewise.
-std::shared_ptr<const PresenceMap> CurrentPresence();
+/// The same list of what is in the store and in the presence file now, empty when there is none. It is made again only
+/// when one of them, the clock or the time zone has changed; any thread may ask.
+/// @throws DatabaseError
+std::shared_ptr<const Json::Value> CurrentList(unsigned sources);
 
 } // namespace vornhost
 

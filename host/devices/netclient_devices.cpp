@@ -35,10 +35,7 @@ int NetClient::GetDeviceListData(const std::string &scannerType, Json::Value &re
       LogError("no such scanner type: \"%s\"", LogText(scannerType).c_str());
       return false;
     }
-    const auto stored = vornhost::CurrentDevices();
-    const auto presence = vornhost::CurrentPresence();
-    const vornhost::Moment now{time(nullptr), vornhost::BootMillis()};
-    Json::Value list = vornhost::RenderDevices(*stored, *presence, sources, now);
+    Json::Value list(*vornhost::CurrentList(sources));
     if (!result.isObject()) {
       result = Json::Value(Json::objectValue);
     }

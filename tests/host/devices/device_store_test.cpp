@@ -229,6 +229,40 @@ TEST_F(DeviceStoreTest, PresenceComesFromMemory) {
 // ---- death in the middle
 
 // A process that writes names one after the other, and says which are stored; it is killed at some moment.
+TEST_F(DeviceStoreTest, ANewSightShowsInTheNextList) {
+  DeviceStore().Write({Laptop()}, {});
+  const int64_t now = vornhost::BootMillis();
+  ASSERT_TRUE(vornhost::WritePresence({{kMac, {now - 30000, {}}}}));
+  const std::string before = List()[0]["asso_time"].asString();
+  EXPECT_EQ(List()[0]["asso_time"].asString(), before);
+  ASSERT_TRUE(vornhost::WritePresence({{kMac, {now - 20000, {}}}}));
+  const std::string after = List()[0]["asso_time"].asString();
+  EXPECT_NE(after, before);
+  ASSERT_EQ(Set(Edit(kMac, "named", "nas")), 0);
+  EXPECT_EQ(List()[0]["userdef_displayName"], "named");
+  EXPECT_EQ(List("arp")[0]["asso_time"].asString(), after);
+}
+
+TEST_F(DeviceStoreTest, WhatACallerDoesWithAListIsItsOwnAffair) {
+  DeviceStore().Write({Laptop()}, {});
+  Json::Value result;
+  ASSERT_EQ(NetClient().GetDeviceListData("all", result), 0);
+  const Json::Value before = result["ClientList"];
+  result["ClientList"][0].clear();
+  EXPECT_EQ(List(), before);
+}
+
+TEST_F(DeviceStoreTest, TheTimeZoneOfTheListIsTheOneThatIsSetNow) {
+  DeviceStore().Write({Laptop()}, {});
+  ASSERT_TRUE(vornhost::WritePresence({{kMac, {vornhost::BootMillis(), {}}}}));
+  const auto hourIn = [](const char *zone) {
+    std::filesystem::remove("/etc/localtime");
+    std::filesystem::create_symlink(std::string("/usr/share/zoneinfo/") + zone, "/etc/localtime");
+    return List()[0]["asso_time"].asString().substr(0, 2);
+  };
+  EXPECT_NE(hourIn("Etc/GMT-3"), hourIn("Etc/GMT+4"));
+}
+
 TEST_F(DeviceStoreTest, WhateverWasStoredSurvivesAKill) {
   int last = 0;
   for (int round = 0; round < 20; ++round) {
