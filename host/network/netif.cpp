@@ -5,12 +5,20 @@
 #include "host/network/names.h"
 #include "host/network/netlink.h"
 #include "host/utility/error.h"
+#include "host/utility/unique_fd.h"
 
+#include <linux/netlink.h>
+#include <linux/rtnetlink.h>
 #include <net/if.h>
 #include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstring>
+#include <memory>
+#include <mutex>
 #include <unordered_map>
 
 namespace vornhost {
@@ -32,15 +40,77 @@ InterfaceAddress Split(const Address &address) {
   return {address.Host(), Ipv4Text(NetmaskOfPrefix(prefix))};
 }
 
+struct Interfaces {
+  std::vector<Link> links;
+  std::unordered_map<int, InterfaceAddress> addresses; // by the link's index
+};
+
 // The first address of an interface is its primary one.
-std::unordered_map<int, InterfaceAddress> FirstAddresses(Netlink &netlink) {
-  std::unordered_map<int, InterfaceAddress> out;
+Interfaces ReadInterfaces() {
+  Netlink netlink;
+  Interfaces out{netlink.Links(), {}};
   for (const Address &address : netlink.Addresses()) {
     if (address.family == AF_INET) {
-      out.try_emplace(address.index, Split(address));
+      out.addresses.try_emplace(address.index, Split(address));
     }
   }
   return out;
+}
+
+// Reading them costs more than most calls that ask for them. The kernel tells of every change before the change's own
+// call returns, so that what was read holds for as long as it has said nothing. A process stays in its network
+// namespace.
+class InterfaceKeeper {
+public:
+  std::shared_ptr<const Interfaces> Get() {
+    const std::lock_guard lock(mutex_);
+    if (!Watch() || HasNews()) {
+      interfaces_.reset(); // also when reading them fails
+    }
+    if (!interfaces_) {
+      interfaces_ = std::make_shared<const Interfaces>(ReadInterfaces());
+    }
+    return interfaces_;
+  }
+
+private:
+  static constexpr int kQueueBytes = 4096; // what is in it is of no interest; that it runs over is news too
+
+  /// @return false when what happened before now is not known
+  bool Watch() {
+    if (socket_.IsOpen() && owner_ == getpid()) { // a child would share the news with its parent
+      return true;
+    }
+    socket_ = UniqueFd(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_ROUTE));
+    owner_ = getpid();
+    sockaddr_nl address{};
+    address.nl_family = AF_NETLINK;
+    address.nl_groups = RTMGRP_LINK | RTMGRP_IPV4_IFADDR;
+    if (!socket_.IsOpen() || setsockopt(socket_.Get(), SOL_SOCKET, SO_RCVBUF, &kQueueBytes, sizeof(kQueueBytes)) != 0 ||
+        bind(socket_.Get(), reinterpret_cast<const sockaddr *>(&address), sizeof(address)) != 0) {
+      socket_.Reset(); // then they are read each time
+    }
+    return false;
+  }
+
+  bool HasNews() {
+    bool any = false;
+    char byte = 0;
+    while (recv(socket_.Get(), &byte, sizeof(byte), MSG_DONTWAIT) >= 0 || errno == ENOBUFS || errno == EINTR) {
+      any = true;
+    }
+    return any;
+  }
+
+  std::mutex mutex_;
+  UniqueFd socket_;
+  pid_t owner_ = 0;
+  std::shared_ptr<const Interfaces> interfaces_;
+};
+
+std::shared_ptr<const Interfaces> CurrentInterfaces() {
+  static InterfaceKeeper keeper;
+  return keeper.Get();
 }
 
 // br0 is on the LAN side only while it is the one bridge.
@@ -55,9 +125,8 @@ int WanMaster(const std::vector<Link> &links) {
 }
 
 int Enumerate(QARDNetInterface *entries, int capacity, int kind) {
-  Netlink netlink;
-  const std::vector<Link> links = netlink.Links();
-  const auto addresses = FirstAddresses(netlink);
+  const auto interfaces = CurrentInterfaces();
+  const auto &[links, addresses] = *interfaces;
   const int wanMaster = WanMaster(links);
   int count = 0;
   for (const Link &link : links) {
@@ -82,10 +151,9 @@ int GetInfo(const char *name, VORNNetIFInfo *info) {
   if (index == 0) {
     return SetError(QARDC_ERR_NOT_FOUND);
   }
-  Netlink netlink;
-  const auto addresses = FirstAddresses(netlink);
-  const auto address = addresses.find(static_cast<int>(index));
-  if (address == addresses.end()) {
+  const auto interfaces = CurrentInterfaces();
+  const auto address = interfaces->addresses.find(static_cast<int>(index));
+  if (address == interfaces->addresses.end()) {
     return SetError(QARDC_ERR_NOT_FOUND);
   }
   *info = {};

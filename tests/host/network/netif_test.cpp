@@ -5,6 +5,9 @@
 
 #include <gmock/gmock.h>
 
+#include <sys/wait.h>
+#include <unistd.h>
+
 #include <array>
 #include <cstring>
 #include <set>
@@ -47,6 +50,41 @@ TEST_F(Netif, AllIsEveryInterfaceInTheKernelsOrder) {
   EXPECT_THAT(Enumerate(QARD_NETIF_ALL), ElementsAre("lo 127.0.0.1/255.0.0.0", "w0 /", "eth0 203.0.113.5/255.255.255.0",
                                                      "lbr0 192.168.1.1/255.255.255.0",
                                                      "gbr0 192.168.2.1/255.255.255.128", "xbr9 10.0.0.1/255.0.0.0"));
+}
+
+TEST_F(Netif, EveryChangeIsSeenByTheNextCall) {
+  MakeRouter();
+  ASSERT_EQ(Enumerate(QARD_NETIF_LAN).size(), 2U);
+  for (int round = 0; round < 50; ++round) {
+    const std::string address = "192.168.77." + std::to_string(round + 1);
+    Shell("ip address flush dev gbr0 scope global && ip address add " + address + "/24 dev gbr0");
+    EXPECT_THAT(Enumerate(QARD_NETIF_LAN), ElementsAre(testing::_, "gbr0 " + address + "/255.255.255.0"));
+  }
+  Shell("ip link set gbr0 name gbr7");
+  EXPECT_EQ(Enumerate(QARD_NETIF_LAN).size(), 1U);
+  Shell("ip link set gbr7 name gbr0 && ip link del lbr0");
+  EXPECT_EQ(Enumerate(QARD_NETIF_LAN).size(), 1U);
+}
+
+TEST_F(Netif, MoreChangesThanTheKernelKeepsForUsAreSeenToo) {
+  MakeRouter();
+  ASSERT_EQ(Enumerate(QARD_NETIF_LAN).size(), 2U);
+  Shell("for i in $(seq 200); do echo \"link set gbr0 mtu $((1300 + i % 7))\"; done | ip -batch -; ip link del gbr0");
+  EXPECT_EQ(Enumerate(QARD_NETIF_LAN).size(), 1U);
+}
+
+TEST_F(Netif, ChildSeesChangesAndTakesNoneFromItsParent) {
+  MakeRouter();
+  ASSERT_EQ(Enumerate(QARD_NETIF_LAN).size(), 2U);
+  Shell("ip link del gbr0");
+  const pid_t child = fork();
+  if (child == 0) {
+    _exit(static_cast<int>(Enumerate(QARD_NETIF_LAN).size()));
+  }
+  int status = 0;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  EXPECT_EQ(WEXITSTATUS(status), 1);
+  EXPECT_EQ(Enumerate(QARD_NETIF_LAN).size(), 1U);
 }
 
 TEST_F(Netif, LanIsLanAndGuestBridge) {
