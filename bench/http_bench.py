@@ -7,20 +7,17 @@ measured in turn, round after round, so that what disturbs the machine disturbs 
 import glob
 import json
 import os
-import re
-import socket
 import statistics
 import subprocess
 import sys
 import tempfile
+import threading
 import time
-import urllib.request
 
-BUILD = os.path.abspath(sys.argv[1])
+from served import CONNECTIONS, SECONDS, load, post, refuse_elsewhere, run, start_server, stop, wait_for
+
+BUILD = os.path.abspath(sys.argv[1]) if len(sys.argv) > 1 else ""
 ROUNDS = int(sys.argv[2]) if len(sys.argv) > 2 else 5
-SECONDS = 2
-CONNECTIONS = (1, 8, 64)
-HEADERS = {}  # of every call: the token
 TOPOLOGY = "/webapi/VORN.Core.Network.Router.Topology/2/get"
 CONSTANT = "/webapi/VORN.Bench.Constant/1/get"
 
@@ -31,10 +28,6 @@ LIMITS = {  # what the figures are held against
     "start to first answer, ms": 100.0,
     "router.so stripped, kB": 300.0,
 }
-
-
-def run(*command):
-    subprocess.run(command, check=True, stdout=subprocess.DEVNULL)
 
 
 def make_home():
@@ -50,37 +43,6 @@ def make_home():
                        "lbr0": "DEVICE=lbr0\nTYPE=Bridge\nIPADDR=192.168.1.1\nNETMASK=255.255.255.0\n"}.items():
         with open(f"{folder}/ifcfg-{name}", "w", encoding="ascii") as file:
             file.write(text)
-
-
-def wait_for(port):
-    for _ in range(2000):
-        with socket.socket() as probe:
-            if probe.connect_ex(("127.0.0.1", port)) == 0:
-                return
-        time.sleep(0.001)
-    raise SystemExit(f"nothing listens on port {port}")
-
-
-def post(port, path):
-    request = urllib.request.Request(f"http://127.0.0.1:{port}{path}", data=b"", method="POST", headers=HEADERS)
-    with urllib.request.urlopen(request, timeout=5) as answer:
-        return answer.read()
-
-
-def make_token():
-    os.environ["VORN_BENCH_STATE"] = tempfile.mkdtemp(prefix="vorn_bench_state.")
-    HEADERS["Authorization"] = "Bearer " + subprocess.run(
-        [f"{BUILD}/webapi/vornwebd", "--state", os.environ["VORN_BENCH_STATE"], "--make-token", "bench"],
-        check=True, capture_output=True, text=True).stdout.strip()
-
-
-def start_server(port, module):
-    if not HEADERS:
-        make_token()
-    server = subprocess.Popen([f"{BUILD}/webapi/vornwebd", "--module", module, "--state",
-                               os.environ["VORN_BENCH_STATE"], "--listen", f"127.0.0.1:{port}"])
-    wait_for(port)
-    return server
 
 
 def start_nginx(port, body, folder):
@@ -100,39 +62,18 @@ http {{ access_log off; keepalive_requests 1000000000; default_type application/
     return yardstick
 
 
-def load(port, method, path, connections):
-    """One run of wrk: requests per second and p99 in microseconds."""
-    fields = "".join(f'wrk.headers["{name}"]="{value}"\n' for name, value in HEADERS.items())
-    script = f'wrk.method="{method}"\n{fields}function done(s, l, r)\n io.write(string.format("RESULT %f %d %d\\n",' \
-             " s.requests / (s.duration / 1e6), l:percentile(99), s.errors.status + s.errors.read + s.errors.timeout))\nend\n"
-    with tempfile.NamedTemporaryFile("w", suffix=".lua") as lua:
-        lua.write(script)
-        lua.flush()
-        out = subprocess.run(["wrk", "-t1", f"-c{connections}", f"-d{SECONDS}s", "-s", lua.name,
-                              f"http://127.0.0.1:{port}{path}"], check=True, capture_output=True, text=True).stdout
-    rate, p99, errors = re.search(r"RESULT (\S+) (\d+) (\d+)", out).groups()
-    if int(errors) != 0:
-        raise SystemExit(f"{errors} failed requests at {path}")
-    return float(rate), int(p99)
-
-
-
-
 def cores_used(server):
     """Seen on which cores, sampled while 8 connections are served."""
-    wrk = subprocess.Popen(["wrk", "-t1", "-c8", "-d2s", "-s", "/dev/stdin", f"http://127.0.0.1:8081{TOPOLOGY}"],
-                           stdin=subprocess.PIPE, stdout=subprocess.DEVNULL, text=True)
-    wrk.stdin.write('wrk.method="POST"\n')
-    wrk.stdin.close()
     seen = {}
-    for _ in range(100):
+    loading = threading.Thread(target=load, args=(8081, "POST", TOPOLOGY, 8))
+    loading.start()
+    while loading.is_alive():
         time.sleep(0.015)
         for stat in glob.glob(f"/proc/{server.pid}/task/*/stat"):
             with open(stat, encoding="ascii") as file:
                 fields = file.read().rsplit(")", 1)[1].split()
             if fields[0] == "R":
                 seen[int(fields[36])] = seen.get(int(fields[36]), 0) + 1
-    wrk.wait()
     return seen
 
 
@@ -146,11 +87,10 @@ def first_answer():
     times = []
     for _ in range(9):
         begin = time.monotonic()
-        server = start_server(8090, f"{BUILD}/router/router.so")
+        server = start_server(BUILD, 8090, f"{BUILD}/router/router.so")
         post(8090, TOPOLOGY)
         times.append((time.monotonic() - begin) * 1000)
-        server.terminate()
-        server.wait()
+        stop(server)
     return statistics.median(times)
 
 
@@ -168,7 +108,7 @@ def measure(targets):
         for connections in CONNECTIONS:
             for name, (port, method, path) in targets.items():
                 results[name, connections].append(load(port, method, path, connections))
-    return {key: (statistics.median(r for r, _ in rows), statistics.median(p for _, p in rows))
+    return {key: (statistics.median(row[0] for row in rows), statistics.median(row[1] for row in rows))
             for key, rows in results.items()}
 
 
@@ -176,20 +116,18 @@ def main():
     make_home()
     with tempfile.TemporaryDirectory() as folder:
         figures = {"start to first answer, ms": first_answer(), "router.so stripped, kB": stripped_size()}
-        server = start_server(8081, f"{BUILD}/router/router.so")
+        server = start_server(BUILD, 8081, f"{BUILD}/router/router.so")
         answer = post(8081, TOPOLOGY)
         if json.loads(answer)["data"]["net_topology"] != "router":
             raise SystemExit(f"unexpected answer: {answer}")
         figures["idle private memory, MB"] = private_megabytes(server.pid)
-        constant = start_server(8082, f"{BUILD}/bench/bench_constant.so")
+        constant = start_server(BUILD, 8082, f"{BUILD}/bench/bench_constant.so")
         nginx = start_nginx(8083, answer, folder)
         medians = measure({"nginx, static file": (8083, "GET", "/answer.json"),
                            "vornwebd, constant": (8082, "POST", CONSTANT),
                            "vornwebd, Topology v2 get": (8081, "POST", TOPOLOGY)})
         cores = cores_used(server)
-        for process in (server, constant, nginx):
-            process.terminate()
-            process.wait()
+        stop(server, constant, nginx)
     report(answer, medians, cores, figures)
 
 
@@ -213,4 +151,6 @@ def report(answer, medians, cores, figures):
     sys.exit(1 if failed or not both else 0)
 
 
-main()
+if __name__ == "__main__":
+    refuse_elsewhere("http_bench.py BUILD_FOLDER [ROUNDS]")
+    main()
