@@ -1,5 +1,6 @@
 #include "host/network/topology_config.h"
 
+#include "host/network/interface_name.h"
 #include "host/network/ipv4.h"
 #include "host/network/mac_address.h"
 #include "host/network/names.h"
@@ -8,11 +9,7 @@
 #include "host/utility/program_runner.h"
 #include "platform/utility.h"
 
-#include <net/if.h>
-
-#include <algorithm>
 #include <array>
-#include <cctype>
 #include <stdexcept>
 
 namespace vornhost {
@@ -80,14 +77,6 @@ void Require(int result, const char *what) {
 }
 
 } // namespace
-
-bool IsInterfaceName(const std::string &name) {
-  const auto isGood = [](unsigned char byte) {
-    return std::isalnum(byte) != 0 || byte == '-' || byte == '_' || byte == '.';
-  };
-  return !name.empty() && name.size() < IFNAMSIZ && name != "." && name != ".." &&
-         std::all_of(name.begin(), name.end(), isGood);
-}
 
 PortConfig ReadPortConfig(const char *path) {
   PortConfig out;

@@ -41,9 +41,6 @@ std::optional<std::string> ReadWanFile();
 /// Puts back what ReadWanFile gave. Throws std::runtime_error when that cannot be done.
 void RestoreWanFile(const std::optional<std::string> &content);
 
-/// A name that the kernel takes for an interface, of letters, digits, '-', '_' and '.'.
-bool IsInterfaceName(const std::string &name);
-
 } // namespace vornhost
 
 #endif

@@ -8,6 +8,7 @@
 #include "host/network/topology_steps.h"
 #include "host/network/turn.h"
 #include "host/utility/log.h"
+#include "host/wireless/access_points.h"
 
 #include <algorithm>
 #include <array>
@@ -59,6 +60,8 @@ bool RestoreSnapshot(Netlink &netlink, const Snapshot &snapshot) {
       whole = Attempt("stop DHCP on", name, [&name] { DhcpClient(name).Stop(); }) && whole;
     }
   }
+  const std::string bridge = LayoutOf(snapshot.from).bridge;
+  whole = Attempt("move access points to", bridge, [&bridge] { MoveAccessPoints(bridge); }) && whole;
   for (const std::string name : kBridges) {
     if (snapshot.Find(name) == nullptr) {
       whole = Attempt("remove", name, [&state, &name] { state.RemoveBridge(name); }) && whole;

@@ -1,6 +1,7 @@
 #include "host/network/topology_snapshot.h"
 
 #include "host/network/dhcp_client.h"
+#include "host/network/interface_name.h"
 #include "host/network/names.h"
 #include "host/network/topology_config.h"
 

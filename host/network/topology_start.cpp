@@ -9,6 +9,7 @@
 #include "host/network/turn.h"
 #include "host/utility/log.h"
 #include "host/utility/program_runner.h"
+#include "host/wireless/access_points.h"
 
 #include <sys/socket.h>
 
@@ -55,6 +56,7 @@ public:
     const PortConfig lan = ReadPortConfig(kLanConfig);
     const PortConfig guest = ReadPortConfig(kGuestConfig);
     MakeBridge(layout_.bridge, layout_.wanInBridge ? WanMac() : lan.mac);
+    Do("move access points to", layout_.bridge, [this] { MoveAccessPoints(layout_.bridge); });
     TakePorts(lan.ports);
     PlaceWanPort();
     Do("remove", other_, [this] { state_.RemoveBridge(other_); });

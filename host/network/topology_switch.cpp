@@ -10,6 +10,7 @@
 #include "host/network/turn.h"
 #include "host/utility/atomic_file.h"
 #include "host/utility/log.h"
+#include "host/wireless/access_points.h"
 
 #include <algorithm>
 
@@ -25,6 +26,7 @@ public:
         to_(LayoutOf(snapshot.to)) {
     AddReleaseUplink();
     AddMakeBridge();
+    AddMoveAccessPoints();
     AddMovePorts();
     AddClearBridge();
     AddStartBridge();
@@ -70,6 +72,15 @@ private:
     steps_.Add(
         "make " + bridge, [this, bridge, mac] { state_.EnsureBridge(bridge, mac); },
         [this, bridge] { snapshot_.Find(bridge) != nullptr ? Restore(bridge) : state_.RemoveBridge(bridge); });
+  }
+
+  // Before the ports: an access point that is started again in the middle goes to where the others will be.
+  void AddMoveAccessPoints() {
+    if (to_.bridge != from_.bridge) {
+      steps_.Add(
+          "move access points to " + to_.bridge, [this] { MoveAccessPoints(to_.bridge); },
+          [this] { MoveAccessPoints(from_.bridge); });
+    }
   }
 
   void AddMovePorts() {

@@ -1,7 +1,7 @@
 #include "host/routes/route_rule.h"
 
+#include "host/network/interface_name.h"
 #include "host/network/ipv4.h"
-#include "host/network/topology_config.h"
 
 #include <linux/rtnetlink.h>
 #include <sys/socket.h>

@@ -1,7 +1,6 @@
 #include "host/wireless/adapter_writer.h"
 
 #include "host/network/names.h"
-#include "host/utility/file_turn.h"
 #include "host/utility/line_file.h"
 #include "host/utility/log.h"
 #include "host/wireless/adapter_config.h"
@@ -21,9 +20,6 @@
 namespace vornhost {
 
 namespace {
-
-// A turn is held for some fsyncs and for the time that hostapd may take to answer.
-constexpr std::chrono::milliseconds kTurnLimit{10000};
 
 struct FilterFiles {
   std::string accept;
@@ -168,10 +164,9 @@ void WriteAdapter(const WirelessAdapter &adapter, const Json::Value &config) {
   const MacFilter filter = ParseMacFilter(config);
   const std::string text = RenderAdapterConfig(config);
   CheckSockets(adapter);
-  mkdir(kRunFolder, 0700); // whoever could open it could hold every change up
   mkdir("/etc/vorn", 0755);
-  mkdir(kWirelessFolder, 0700); // as the run folder, and who is in a list is nobody's business
-  const UniqueFd turn = TakeFileTurn(std::string(kRunFolder) + "/wireless.lock", kTurnLimit);
+  mkdir(kWirelessFolder, 0700); // who is in a list is nobody's business
+  const UniqueFd turn = TakeHostapdTurn();
   const MacFilter before = StoredFilter(adapter.name);
   const Deadline deadline = std::chrono::steady_clock::now() + kAnswerLimit;
   FileChanges changes;

@@ -1,11 +1,16 @@
 #include "host/wireless/hostapd_config.h"
 
-#include "host/network/topology_config.h"
+#include "host/network/interface_name.h"
+#include "host/network/names.h"
 #include "host/utility/atomic_file.h"
+#include "host/utility/file_turn.h"
 #include "host/utility/line_file.h"
 #include "host/utility/log.h"
 
+#include <sys/stat.h>
+
 #include <algorithm>
+#include <chrono>
 #include <filesystem>
 #include <iterator>
 #include <utility>
@@ -15,6 +20,9 @@ namespace vornhost {
 namespace {
 
 namespace fs = std::filesystem;
+
+// A turn is held for some fsyncs and for the time that hostapd may take to answer.
+constexpr std::chrono::milliseconds kTurnLimit{10000};
 
 // "/run/hostapd", or "DIR=/run/hostapd GROUP=netdev".
 std::string ControlFolder(std::string_view value) {
@@ -65,6 +73,11 @@ void MoveGuests(std::vector<WirelessAdapter> &adapters) {
 
 } // namespace
 
+UniqueFd TakeHostapdTurn() {
+  mkdir(kRunFolder, 0700); // whoever could open it could hold every change up
+  return TakeFileTurn(std::string(kRunFolder) + "/wireless.lock", kTurnLimit);
+}
+
 std::string GuestNetworkOf(const std::string &adapter) {
   return "g" + adapter;
 }
@@ -84,9 +97,11 @@ std::vector<WirelessNetwork> ParseHostapdConfig(std::string_view content, const 
         LogError("%s: \"%s\" is no interface name", LogText(file).c_str(), LogText(value).c_str());
         return {};
       }
-      networks.push_back({value, "", file});
+      networks.push_back({value, "", file, ""});
     } else if (key == "ctrl_interface" && !networks.empty()) {
       networks.back().control = ControlFolder(value) + "/" + networks.back().name;
+    } else if (key == "bridge" && !networks.empty()) {
+      networks.back().bridge = value;
     }
   }
   return networks;

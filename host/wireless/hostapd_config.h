@@ -6,6 +6,8 @@
 #ifndef HOST_WIRELESS_HOSTAPD_CONFIG_H
 #define HOST_WIRELESS_HOSTAPD_CONFIG_H
 
+#include "host/utility/unique_fd.h"
+
 #include <string>
 #include <string_view>
 #include <vector>
@@ -19,12 +21,17 @@ struct WirelessNetwork {
   std::string name;    ///< of its interface
   std::string control; ///< path of its control socket; empty when its part of the file has no ctrl_interface
   std::string file;    ///< the configuration file that it is in
+  std::string bridge;  ///< that it is a port of; empty when its part of the file names none
 };
 
 struct WirelessAdapter {
   std::string name;
   std::vector<WirelessNetwork> networks; ///< the first is the main one
 };
+
+/// Waits for the turn at changing hostapd's files; it ends with the descriptor. Throws std::runtime_error when it
+/// cannot be had in time.
+UniqueFd TakeHostapdTurn();
 
 std::string GuestNetworkOf(const std::string &adapter);
 

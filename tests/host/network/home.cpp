@@ -125,6 +125,7 @@ std::string Picture() {
     }
   }
   Print(out, settings);
+  out << Shell("grep -H ^bridge= /etc/hostapd/*.conf || true");
   out << (fs::exists(fs::symlink_status(kLock)) ? "locked" : "not locked") << "\n";
   return out.str();
 }
@@ -162,6 +163,7 @@ void Home::SetUpTestSuite() {
   Install(VORN_PROGRAMS_SOURCE "/udhcpc.script", "/usr/vorn/sbin/udhcpc.script", fs::perms{0755});
   Install(VORN_PROGRAMS_SOURCE "/base-firewall.nft", "/usr/vorn/share/base-firewall.nft", fs::perms{0644});
   fs::create_directories("/etc/sysconfig/network-scripts");
+  fs::create_directories("/etc/hostapd");
   // Duplicate address detection would let every address of IPv6 come a second late.
   WriteFile("/proc/sys/net/ipv6/conf/default/accept_dad", "0");
 }
@@ -181,6 +183,8 @@ void Home::SetUp() {
   WriteFile(kLanFile,
             "DEVICE=lbr0\nTYPE=Bridge\nIPADDR=192.168.1.1\nNETMASK=255.255.255.0\nPORTS=\"lan1 lan2 lan3\"\n");
   WriteFile(kGuestFile, "DEVICE=gbr0\nTYPE=Bridge\nIPADDR=192.168.2.1\nNETMASK=255.255.255.0\nPORTS=\"guest1\"\n");
+  WriteFile(kAccessPointFile, "interface=wlan0\nbridge=lbr0\nctrl_interface=/run/hostapd\n# bridge=lbr0\nssid=home\n\n"
+                              "bss=gwlan0\nbridge=gbr0\nbss=xwlan0\nbridge=lbr0\n");
   StartDhcpServer();
   TakeSystemLog();
   ASSERT_EQ(Run("start"), 0) << TakeSystemLog();

@@ -15,8 +15,10 @@ constexpr char kWanFile[] = "/etc/sysconfig/network-scripts/ifcfg-eth0";
 constexpr char kLanFile[] = "/etc/sysconfig/network-scripts/ifcfg-lbr0";
 constexpr char kGuestFile[] = "/etc/sysconfig/network-scripts/ifcfg-gbr0";
 
-/// What the tests compare: every link with its ports and addresses, the routes, the DHCP clients, the WAN port's file
-/// and the lock. Link-local IPv6 is left out, because the kernel makes it in its own time.
+constexpr char kAccessPointFile[] = "/etc/hostapd/wlan0.conf";
+
+/// What the tests compare: every link with its ports and addresses, the routes, the DHCP clients, the WAN port's file,
+/// the access points' bridges and the lock. Link-local IPv6 is left out, because the kernel makes it in its own time.
 std::string Picture();
 
 /// Starts a program without waiting for it. @return its process

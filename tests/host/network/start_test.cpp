@@ -55,6 +55,12 @@ TEST_F(Start, GoesFromOneTopologyToTheConfiguredOne) {
   EXPECT_EQ(Picture(), router);
 }
 
+TEST_F(Start, AccessPointsAreInTheConfiguredBridge) {
+  WriteFile(hosttest::kAccessPointFile, "interface=wlan0\nbridge=br0\n");
+  ASSERT_EQ(Run("start"), 0);
+  EXPECT_EQ(ReadFile(hosttest::kAccessPointFile), "interface=wlan0\nbridge=lbr0\n");
+}
+
 TEST_F(Start, OneMissingPortDoesNotCostTheOthers) {
   Shell("ip link delete lbr0");
   WriteFile(kLanFile, "DEVICE=lbr0\nIPADDR=192.168.1.1\nNETMASK=255.255.255.0\nPORTS=\"lan1 nosuch ../x lan2\"\n");
@@ -77,7 +83,7 @@ TEST_F(Start, GuestBridgeIsOptional) {
   Shell("ip link delete gbr0");
   fs::remove(kGuestFile);
   EXPECT_EQ(Run("start"), 0);
-  EXPECT_THAT(Picture(), Not(HasSubstr("gbr0")));
+  EXPECT_THAT(Picture(), Not(HasSubstr("link gbr0")));
 }
 
 TEST_F(Start, ConfiguredMacAddressIsTheBridges) {

@@ -135,6 +135,17 @@ TEST_F(Switch, PortThatHostapdAddedMovesToo) {
   EXPECT_THAT(Shell("ip link show wlan9"), HasSubstr("master lbr0"));
 }
 
+// hostapd started in the other topology, or again, puts its networks where its file says.
+TEST_F(Switch, AccessPointsFilesFollow) {
+  const std::string before = ReadFile(hosttest::kAccessPointFile);
+  ASSERT_EQ(Run("switch bridge"), 0);
+  EXPECT_EQ(ReadFile(hosttest::kAccessPointFile),
+            "interface=wlan0\nbridge=br0\nctrl_interface=/run/hostapd\n# bridge=lbr0\nssid=home\n\n"
+            "bss=gwlan0\nbridge=gbr0\nbss=xwlan0\nbridge=br0\n");
+  ASSERT_EQ(Run("switch router"), 0);
+  EXPECT_EQ(ReadFile(hosttest::kAccessPointFile), before);
+}
+
 TEST_F(Switch, StaticWanAddressGoesAlong) {
   ASSERT_EQ(Run("switch bridge"), 0);
   WriteFile(kWanFile, "DEVICE=eth0\nBOOTPROTO=static\nIPADDR=203.0.113.7\nNETMASK=255.255.255.0\n"
@@ -202,6 +213,15 @@ TEST_F(UndoneSwitch, ConfigurationIsALink) {
   EXPECT_EQ(Run("switch bridge"), 1);
   EXPECT_EQ(ReadFile("/etc/wan"), "# the way out\nDEVICE=eth0\nBOOTPROTO=dhcp\nSLAVE=no\n");
   Shell(std::string("rm ") + kWanFile + " && mv /etc/wan " + kWanFile);
+}
+
+TEST_F(UndoneSwitch, AccessPointsFileIsALink) {
+  const std::string file = hosttest::kAccessPointFile;
+  const std::string content = ReadFile(file);
+  Shell("mv " + file + " /etc/wlan0 && ln -s /etc/wlan0 " + file);
+  EXPECT_EQ(Run("switch bridge"), 1);
+  EXPECT_EQ(ReadFile("/etc/wlan0"), content);
+  Shell("rm " + file + " && mv /etc/wlan0 " + file);
 }
 
 TEST_F(UndoneSwitch, LockCannotBeMade) {
