@@ -255,7 +255,7 @@ TEST_F(MacFilterTest, Set_ListThatIsNoTextAnswers4300WithNull) {
 }
 
 TEST_F(MacFilterTest, Set_JsonThatIsNoArrayAnswers4300WithIt) {
-  for (const char *list : {R"({"mac":"a"})", "{}"}) {
+  for (const char *list : {R"({"mac":"a"})", "{}", "7", R"("text")", "true", "null"}) {
     scripted::Reset();
     EXPECT_EQ(SetAnswer(Parameters("deny", list)), std::string("SetError(4300, ") + list + ")");
     EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());

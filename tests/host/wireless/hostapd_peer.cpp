@@ -87,7 +87,12 @@ void FakeHostapd::Serve() {
       const std::lock_guard<std::mutex> lock(mutex_);
       requests_.push_back(request);
     }
-    if (const auto answer = answer_(request)) {
+    const auto answer = answer_(request);
+    if (answer == kDeath) {
+      socket_.Reset();
+      return;
+    }
+    if (answer) {
       sendto(socket_.Get(), answer->data(), answer->size(), 0, reinterpret_cast<const sockaddr *>(&from), length);
     }
   }

@@ -21,6 +21,9 @@ constexpr char kControlFolder[] = "/run/hostapd";
 /// Writes /etc/hostapd/<name>.conf: one network of its own, with a control socket and no radio.
 void WriteHostapdConfig(const std::string &name, const std::string &more = "");
 
+/// As an answer: the stand-in dies, its socket's file stays.
+constexpr char kDeath[] = "death";
+
 /// An answer for a request; nothing: none is sent.
 using Answerer = std::function<std::optional<std::string>(const std::string &request)>;
 

@@ -283,6 +283,23 @@ TEST_F(WifiApply, GarbageAndSilenceInTheMiddleAreRefusals) {
   }
 }
 
+// What is asked of it next finds nobody: neither an answer nor a way to put the old filter back. The files are back.
+TEST_F(WifiApply, HostapdThatDiesInTheMiddleIsARefusalAndTheFilesAreAsTheyWere) {
+  WriteHostapdConfig("wlan0");
+  ASSERT_GE(Apply("wlan0", Config("deny", {kPhone})), 0);
+  const std::string before = Picture();
+  for (const char *last : {"SET macaddr_acl 0", "DENY_ACL CLEAR", "SET macaddr_acl 1", "STA-FIRST"}) {
+    FakeHostapd hostapd("wlan0", [&last](const std::string &request) -> std::optional<std::string> {
+      return request == last ? hosttest::kDeath : Obedient({StationText(kPhone, true)})(request);
+    });
+    const auto start = steady_clock::now();
+    EXPECT_LT(Apply("wlan0", Config("allow", {kLaptop})), 0) << last;
+    EXPECT_LT(steady_clock::now() - start, std::chrono::milliseconds(2800)) << last;
+    EXPECT_EQ(Picture(), before) << last;
+  }
+  EXPECT_GE(Apply("wlan0", Config("allow", {kLaptop})), 0); // dead, it is read when it starts
+}
+
 TEST_F(WifiApply, SymbolicLinkInAFilesPlaceIsRefused) {
   WriteHostapdConfig("wlan0");
   WriteText("/tmp/elsewhere", "precious\n");

@@ -287,6 +287,14 @@ TEST_F(WifiList, SilenceInTheMiddleOfTheWalkIsNoList) {
   EXPECT_LT(TimeOf([] { EXPECT_EQ(Stations("wlan0"), "failed"); }), kPatience);
 }
 
+TEST_F(WifiList, HostapdThatDiesInTheMiddleOfTheWalkGivesNoList) {
+  WriteHostapdConfig("wlan0");
+  const FakeHostapd dying("wlan0", [](const std::string &request) -> std::optional<std::string> {
+    return request == "STA-FIRST" ? StationText(kPhone, true) : hosttest::kDeath;
+  });
+  EXPECT_LT(TimeOf([] { EXPECT_EQ(Stations("wlan0"), "failed"); }), kPatience);
+}
+
 TEST_F(WifiList, StoredFilterIsPartOfTheConfiguration) {
   WriteHostapdConfig("wlan0");
   WriteText("/etc/vorn/wireless/wlan0.json",
