@@ -138,17 +138,6 @@ KernelLink &ThreadsLink() {
   return link;
 }
 
-// An access point is a port of the LAN bridge; one that stands alone is the way out.
-bool HasWirelessUplink() {
-  for (const std::string &name : WirelessInterfaces()) {
-    std::error_code ignored;
-    if (!fs::exists("/sys/class/net/" + name + "/master", ignored)) {
-      return true;
-    }
-  }
-  return false;
-}
-
 } // namespace
 
 const char *CurrentTopology() {
@@ -161,7 +150,8 @@ const char *CurrentTopology() {
     if (master == kOneBridge) {
       return kBridgeTopology;
     }
-    return master == kLanBridge && HasWirelessUplink() ? kClientTopology : nullptr;
+    // Also when its adapter was pulled out: what could not be told could not be left.
+    return master == kLanBridge ? kClientTopology : nullptr;
   case WanState::kAbsent:
   case WanState::kFailed:
     break;

@@ -23,9 +23,12 @@ constexpr char kOneBridgeConfig[] = "/etc/sysconfig/network-scripts/ifcfg-br0";
 constexpr char kTopologyLock[] = "/tmp/topology.lock";
 constexpr char kRunFolder[] = "/run/vorn";
 
+constexpr char kWirelessFolder[] = "/etc/vorn/wireless";
+
 constexpr char kTopologyProgram[] = "/usr/vorn/sbin/vorntopology";
 constexpr char kDhcpClientProgram[] = "/usr/sbin/udhcpc";
 constexpr char kDhcpClientScript[] = "/usr/vorn/sbin/udhcpc.script";
+constexpr char kSupplicantProgram[] = "/usr/sbin/wpa_supplicant";
 constexpr char kNftProgram[] = "/usr/sbin/nft";
 constexpr char kBaseFirewall[] = "/usr/vorn/share/base-firewall.nft";
 

@@ -1,5 +1,7 @@
 #include "host/network/netlink.h"
 
+#include "host/network/ipv4.h"
+
 #include <linux/if_link.h>
 #include <linux/rtnetlink.h>
 #include <net/if.h>
@@ -16,6 +18,7 @@
 #include <sys/socket.h>
 #include <sys/time.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstring>
@@ -29,6 +32,12 @@ struct AddrDeleter {
   void operator()(nl_addr *address) const { nl_addr_put(address); }
 };
 using Addr = std::unique_ptr<nl_addr, AddrDeleter>;
+
+// Of an IPv4 address in a message of the kernel.
+int PrefixOf(const std::string &address) {
+  const size_t slash = address.find('/');
+  return slash == std::string::npos ? 32 : std::clamp(std::stoi(address.substr(slash + 1)), 0, 32);
+}
 
 std::string Text(nl_addr *address) {
   if (address == nullptr || nl_addr_get_len(address) == 0) {
@@ -163,6 +172,13 @@ bool Address::IsLinkLocal6() const {
 
 std::string Address::Host() const {
   return text.substr(0, text.find('/'));
+}
+
+bool Address::Overlaps(const Address &other) const {
+  const auto mine = ParseIpv4(Host().c_str());
+  const auto others = ParseIpv4(other.Host().c_str());
+  const uint32_t mask = NetmaskOfPrefix(std::min(PrefixOf(text), PrefixOf(other.text)));
+  return mine && others && (*mine & mask) == (*others & mask);
 }
 
 void Netlink::SocketDeleter::operator()(nl_sock *socket) const {

@@ -45,6 +45,8 @@ struct Address {
   bool IsLinkLocal6() const;
   /// Without the prefix length.
   std::string Host() const;
+  /// Whether both are IPv4 and one's subnet has addresses of the other's.
+  bool Overlaps(const Address &other) const;
 };
 
 /// A unicast route over one next hop, or one hop of a route that has several.

@@ -122,6 +122,10 @@ void NetworkState::SetUp(const std::string &name) {
   }
 }
 
+void NetworkState::SetDown(const std::string &name) {
+  netlink_.SetUp(Get(name).index, false);
+}
+
 void NetworkState::Clear(const std::string &name) {
   const int index = Get(name).index;
   for (const Route &route : netlink_.Routes()) {

@@ -26,6 +26,7 @@ public:
   /// Releases a port: up, with a link-local address again.
   void Detach(const std::string &port);
   void SetUp(const std::string &name);
+  void SetDown(const std::string &name);
 
   /// Takes every address and every route away from a link.
   void Clear(const std::string &name);

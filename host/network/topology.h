@@ -35,9 +35,10 @@ Result ShowStatus(std::ostream &out);
 struct Layout {
   std::string bridge; ///< of the LAN ports
   bool wanInBridge;
-  std::string uplink;
+  std::string uplink; ///< empty in client topology without an upstream
 };
-Layout LayoutOf(const std::string &topology);
+/// @param[in] upstream  the interface that joins a network outside in client topology; empty: there is none
+Layout LayoutOf(const std::string &topology, const std::string &upstream);
 
 /// Looks for the lock of a switch that died and brings back what it held. The caller has its turn.
 Result RecoverStale(Netlink &netlink);
@@ -46,9 +47,10 @@ bool RestoreSnapshot(Netlink &netlink, const Snapshot &snapshot);
 /// Makes links, ports and addresses what the files say. @return as above
 bool ApplyConfiguration(Netlink &netlink);
 /// Gives the way out its address: by DHCP or as configured.
+/// @param[in] uplink       of the topology's layout
 /// @param[in] leaseNeeded  a DHCP server that does not answer is a failure
 /// Throws std::runtime_error when it fails.
-void ConnectUplink(Netlink &netlink, const std::string &topology, bool leaseNeeded);
+void ConnectUplink(Netlink &netlink, const std::string &topology, const std::string &uplink, bool leaseNeeded);
 /// Bridged frames do not pass the firewall of routed ones. What is not permitted stays as it is.
 void LetBridgesForward();
 

@@ -9,6 +9,7 @@
 #include "host/network/turn.h"
 #include "host/utility/log.h"
 #include "host/wireless/access_points.h"
+#include "host/wireless/supplicant.h"
 
 #include <algorithm>
 #include <array>
@@ -17,7 +18,6 @@ namespace vornhost {
 
 namespace {
 
-constexpr std::array<const char *, 2> kUplinks = {kWanPort, kOneBridge};
 constexpr std::array<const char *, 2> kBridges = {kLanBridge, kOneBridge};
 
 bool WasServed(const Snapshot &snapshot, const std::string &name) {
@@ -31,6 +31,42 @@ void ResumeDhcp(const Snapshot &snapshot, const std::string &name) {
   if (!client.IsRunning() && link != nullptr) {
     client.Resume(link->FirstIpv4());
   }
+}
+
+// One that was not running is ended before its interface is put back, one that was is started last, as DHCP clients
+// are.
+bool RestoreJoined(const Snapshot &snapshot) {
+  const Supplicant supplicant;
+  if (!snapshot.joined || supplicant.IsRunning()) {
+    return true;
+  }
+  return Attempt("join over", snapshot.upstream, [&] { supplicant.Start(snapshot.upstream); });
+}
+
+bool StopClients(const Snapshot &snapshot) {
+  bool whole = true;
+  for (const std::string &name : {std::string(kWanPort), std::string(kOneBridge), snapshot.upstream}) {
+    if (!name.empty() && !WasServed(snapshot, name)) {
+      whole = Attempt("stop DHCP on", name, [&name] { DhcpClient(name).Stop(); }) && whole;
+    }
+  }
+  if (!snapshot.upstream.empty() && !snapshot.joined) {
+    whole = Attempt("leave over", snapshot.upstream, [] { Supplicant().Stop(); }) && whole;
+  }
+  return whole;
+}
+
+// What became a way out only with the switch has a default route that would keep the old one's from coming back.
+bool ClearNewUplinks(Netlink &netlink, const Snapshot &snapshot) {
+  NetworkState state(netlink);
+  bool whole = true;
+  for (const LinkState &link : snapshot.links) {
+    const std::string &name = link.link.name;
+    if ((name == kWanPort || name == snapshot.upstream) && link.FirstIpv4().empty() && netlink.FindLink(name)) {
+      whole = Attempt("clear", name, [&state, &name] { state.Clear(name); }) && whole;
+    }
+  }
+  return whole;
 }
 
 bool RestoreFromLock(Netlink &netlink, const TopologyLock &lock) {
@@ -54,13 +90,9 @@ bool RestoreFromLock(Netlink &netlink, const TopologyLock &lock) {
 // last, on links that are as they left them.
 bool RestoreSnapshot(Netlink &netlink, const Snapshot &snapshot) {
   NetworkState state(netlink);
-  bool whole = true;
-  for (const std::string name : kUplinks) {
-    if (!WasServed(snapshot, name)) {
-      whole = Attempt("stop DHCP on", name, [&name] { DhcpClient(name).Stop(); }) && whole;
-    }
-  }
-  const std::string bridge = LayoutOf(snapshot.from).bridge;
+  bool whole = StopClients(snapshot);
+  whole = ClearNewUplinks(netlink, snapshot) && whole;
+  const std::string bridge = LayoutOf(snapshot.from, "").bridge;
   whole = Attempt("move access points to", bridge, [&bridge] { MoveAccessPoints(bridge); }) && whole;
   for (const std::string name : kBridges) {
     if (snapshot.Find(name) == nullptr) {
@@ -71,6 +103,7 @@ bool RestoreSnapshot(Netlink &netlink, const Snapshot &snapshot) {
     whole = Attempt("restore", link.link.name, [&state, &link] { state.Restore(link); }) && whole;
   }
   whole = Attempt("restore", kWanConfig, [&snapshot] { RestoreWanFile(snapshot.wanFile); }) && whole;
+  whole = RestoreJoined(snapshot) && whole;
   for (const std::string &name : snapshot.dhcpInterfaces) {
     whole = Attempt("resume DHCP on", name, [&snapshot, &name] { ResumeDhcp(snapshot, name); }) && whole;
   }

@@ -4,6 +4,7 @@
 #include "host/network/interface_name.h"
 #include "host/network/names.h"
 #include "host/network/topology_config.h"
+#include "host/wireless/supplicant.h"
 
 #include <json/reader.h>
 #include <json/value.h>
@@ -135,6 +136,8 @@ Snapshot ReadSnapshot(const Json::Value &object) {
   reader.Field("from", out.from);
   reader.Field("to", out.to);
   reader.Field("boot", out.boot);
+  reader.Field("upstream", out.upstream);
+  reader.Field("joined", out.joined);
   for (const Json::Value &link : object["links"]) {
     out.links.push_back(ReadLink(link));
   }
@@ -150,12 +153,12 @@ Snapshot ReadSnapshot(const Json::Value &object) {
   return out;
 }
 
-bool IsConcerned(const Link &link, const std::string &master) {
-  const std::array<std::string, 3> names = {kWanPort, kLanBridge, kOneBridge};
+bool IsConcerned(const Link &link, const std::string &master, const std::string &upstream) {
+  const std::array<std::string, 4> names = {kWanPort, kLanBridge, kOneBridge, upstream};
   const auto has = [&names](const std::string &name) {
     return std::find(names.begin(), names.end(), name) != names.end();
   };
-  return has(link.name) || has(master);
+  return has(link.name) || (!master.empty() && has(master));
 }
 
 } // namespace
@@ -178,11 +181,12 @@ std::string BootId() {
   return id;
 }
 
-Snapshot TakeSnapshot(Netlink &netlink, const std::string &from, const std::string &to) {
-  Snapshot out{from, to, BootId(), {}, {}, ReadWanFile()};
-  for (const char *uplink : {kWanPort, kOneBridge}) {
-    if (DhcpClient(uplink).IsRunning()) {
-      out.dhcpInterfaces.emplace_back(uplink);
+Snapshot TakeSnapshot(Netlink &netlink, const std::string &from, const std::string &to, const std::string &upstream) {
+  const bool joined = !upstream.empty() && Supplicant().IsRunning();
+  Snapshot out{from, to, BootId(), upstream, joined, {}, {}, ReadWanFile()};
+  for (const std::string &uplink : {std::string(kWanPort), std::string(kOneBridge), upstream}) {
+    if (!uplink.empty() && DhcpClient(uplink).IsRunning()) {
+      out.dhcpInterfaces.push_back(uplink);
     }
   }
   const std::vector<Link> links = netlink.Links();
@@ -194,7 +198,7 @@ Snapshot TakeSnapshot(Netlink &netlink, const std::string &from, const std::stri
   const std::vector<Route> routes = netlink.Routes();
   for (const Link &link : links) {
     LinkState state{link, link.master != 0 ? names[link.master] : "", {}, {}};
-    if (!IsConcerned(link, state.master)) {
+    if (!IsConcerned(link, state.master, upstream)) {
       continue;
     }
     const auto isOfLink = [&link](const auto &entry) { return entry.index == link.index; };
@@ -210,6 +214,8 @@ std::string SnapshotText(const Snapshot &snapshot) {
   out["from"] = snapshot.from;
   out["to"] = snapshot.to;
   out["boot"] = snapshot.boot;
+  out["upstream"] = snapshot.upstream;
+  out["joined"] = std::to_string(static_cast<int>(snapshot.joined));
   out["links"] = Json::Value(Json::arrayValue);
   for (const LinkState &state : snapshot.links) {
     out["links"].append(LinkJson(state));

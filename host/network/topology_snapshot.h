@@ -24,7 +24,9 @@ struct LinkState {
 struct Snapshot {
   std::string from; ///< topology
   std::string to;
-  std::string boot; ///< the kernel's boot id: after a restart the interfaces say nothing any more
+  std::string boot;     ///< the kernel's boot id: after a restart the interfaces say nothing any more
+  std::string upstream; ///< the interface that joins a network outside before or after the switch; empty: none
+  bool joined = false;  ///< wpa_supplicant ran on it
   std::vector<LinkState> links;
   std::vector<std::string> dhcpInterfaces; ///< those that a DHCP client served
   std::optional<std::string> wanFile;      ///< nothing: there was none
@@ -33,9 +35,9 @@ struct Snapshot {
   const LinkState *Find(const std::string &name) const;
 };
 
-/// Records the WAN port, the bridges lbr0 and br0 and all their ports. Throws std::runtime_error when something cannot
-/// be read.
-Snapshot TakeSnapshot(Netlink &netlink, const std::string &from, const std::string &to);
+/// Records the WAN port, the bridges lbr0 and br0 and all their ports, and the upstream's interface. Throws
+/// std::runtime_error when something cannot be read.
+Snapshot TakeSnapshot(Netlink &netlink, const std::string &from, const std::string &to, const std::string &upstream);
 
 /// The kernel's id of this boot.
 std::string BootId();

@@ -10,14 +10,18 @@
 #include "host/utility/log.h"
 #include "host/utility/program_runner.h"
 #include "host/wireless/access_points.h"
+#include "host/wireless/supplicant.h"
+#include "host/wireless/upstream.h"
 
 #include <sys/socket.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <cstring>
 #include <fstream>
 #include <stdexcept>
+#include <thread>
 
 namespace vornhost {
 
@@ -49,13 +53,13 @@ void ConnectPort(Netlink &netlink, const std::string &port, const PortConfig &co
 class Configurer {
 public:
   Configurer(Netlink &netlink, const std::string &topology)
-      : netlink_(netlink), state_(netlink), topology_(topology), layout_(LayoutOf(topology)),
+      : netlink_(netlink), state_(netlink), topology_(topology), layout_(LayoutOf(topology, UpstreamOf(topology))),
         other_(layout_.bridge == kLanBridge ? kOneBridge : kLanBridge) {}
 
   bool Run() {
     const PortConfig lan = ReadPortConfig(kLanConfig);
     const PortConfig guest = ReadPortConfig(kGuestConfig);
-    MakeBridge(layout_.bridge, layout_.wanInBridge ? WanMac() : lan.mac);
+    MakeBridge(layout_.bridge, layout_.bridge == kOneBridge ? WanMac() : lan.mac);
     Do("move access points to", layout_.bridge, [this] { MoveAccessPoints(layout_.bridge); });
     TakePorts(lan.ports);
     PlaceWanPort();
@@ -72,6 +76,15 @@ public:
   }
 
 private:
+  static std::string UpstreamOf(const std::string &topology) {
+    std::string why;
+    std::string upstream = topology == kClientTopology ? FindUpstream(why) : "";
+    if (!why.empty()) {
+      LogError("no way out in client topology: %s", LogText(why).c_str());
+    }
+    return upstream;
+  }
+
   void Do(const char *kind, const std::string &name, const Action &action) {
     whole_ = Attempt(kind, name, action) && whole_;
   }
@@ -124,13 +137,30 @@ private:
   }
 
   void Connect() {
-    const std::string unused = layout_.uplink == kWanPort ? kOneBridge : kWanPort;
-    Do("stop DHCP on", unused, [&unused] { DhcpClient(unused).Stop(); });
+    StopUnused();
+    if (layout_.uplink.empty()) {
+      whole_ = false;
+      return;
+    }
+    if (topology_ == kClientTopology && !Supplicant().IsRunning()) {
+      Do("join over", layout_.uplink, [this] { Supplicant().Start(layout_.uplink); });
+    }
     Do("connect", layout_.uplink, [this] {
       if (!DhcpClient(layout_.uplink).IsRunning()) {
-        ConnectUplink(netlink_, topology_, false);
+        ConnectUplink(netlink_, topology_, layout_.uplink, false);
       }
     });
+  }
+
+  void StopUnused() {
+    for (const std::string &unused : {std::string(kWanPort), std::string(kOneBridge), Supplicant::Interface()}) {
+      if (!unused.empty() && unused != layout_.uplink) {
+        Do("stop DHCP on", unused, [&unused] { DhcpClient(unused).Stop(); });
+      }
+    }
+    if (topology_ != kClientTopology) {
+      Do("leave", "the network outside", [] { Supplicant().Stop(); });
+    }
   }
 
   // A second way out beside the topology's own, where there is one and its file says so.
@@ -166,6 +196,15 @@ void LetRouterForward() {
   }
 }
 
+// When the machine starts, an adapter on USB may be found later than the network is brought up.
+void AwaitAdapter() {
+  constexpr int kRounds = 100;
+  std::string ignored;
+  for (int round = 0; round < kRounds && FindUpstream(ignored).empty(); ++round) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  }
+}
+
 void LoadFirewall() {
   if (ProgramRunner().Run({kNftProgram, "-f", kBaseFirewall}) != 0) {
     throw std::runtime_error("nft did not take it");
@@ -180,9 +219,14 @@ void LetBridgesForward() {
   }
 }
 
-void ConnectUplink(Netlink &netlink, const std::string &topology, bool leaseNeeded) {
-  const PortConfig config = topology == kBridgeTopology ? ReadOneBridgeConfig() : ReadPortConfig(kWanConfig);
-  ConnectPort(netlink, LayoutOf(topology).uplink, config, leaseNeeded);
+void ConnectUplink(Netlink &netlink, const std::string &topology, const std::string &uplink, bool leaseNeeded) {
+  PortConfig config;
+  if (topology == kClientTopology) {
+    config.dhcp = true; // a network that one joins tells who one is in it
+  } else {
+    config = topology == kBridgeTopology ? ReadOneBridgeConfig() : ReadPortConfig(kWanConfig);
+  }
+  ConnectPort(netlink, uplink, config, leaseNeeded);
 }
 
 bool ApplyConfiguration(Netlink &netlink) {
@@ -203,7 +247,7 @@ Result StartNetwork() {
   LetBridgesForward();
   whole = whole && Attempt("start", "forwarding", LetRouterForward);
   if (ConfiguredTopology() == std::string(kClientTopology)) {
-    LogError("%s asks for \"client\", which this router cannot be: it comes up as \"router\"", kWanConfig);
+    AwaitAdapter();
   }
   whole = ApplyConfiguration(netlink) && whole;
   return whole ? Result::kDone : Result::kFailed;

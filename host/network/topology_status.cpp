@@ -3,6 +3,7 @@
 #include "host/network/current_topology.h"
 #include "host/network/names.h"
 #include "host/network/topology_config.h"
+#include "host/wireless/upstream.h"
 
 #include <sys/stat.h>
 
@@ -41,6 +42,9 @@ Result ShowStatus(std::ostream &out) {
   const char *topology = CurrentTopology();
   out << "topology:   " << (topology != nullptr ? topology : "none") << "\n";
   out << "configured: " << ConfiguredTopology() << "\n";
+  std::string why;
+  const std::string upstream = FindUpstream(why);
+  out << "upstream:   " << (upstream.empty() ? "none: " + why : upstream) << "\n";
   out << "lock:       " << LockText() << "\n";
   Netlink netlink;
   const std::vector<Link> links = netlink.Links();

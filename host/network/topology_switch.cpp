@@ -11,8 +11,11 @@
 #include "host/utility/atomic_file.h"
 #include "host/utility/log.h"
 #include "host/wireless/access_points.h"
+#include "host/wireless/supplicant.h"
+#include "host/wireless/upstream.h"
 
 #include <algorithm>
+#include <stdexcept>
 
 namespace vornhost {
 
@@ -22,8 +25,9 @@ namespace {
 class SwitchPlan {
 public:
   SwitchPlan(Netlink &netlink, const Snapshot &snapshot)
-      : netlink_(netlink), state_(netlink), snapshot_(snapshot), from_(LayoutOf(snapshot.from)),
-        to_(LayoutOf(snapshot.to)) {
+      : netlink_(netlink), state_(netlink), snapshot_(snapshot), from_(LayoutOf(snapshot.from, snapshot.upstream)),
+        to_(LayoutOf(snapshot.to, snapshot.upstream)) {
+    AddJoin();
     AddReleaseUplink();
     AddMakeBridge();
     AddMoveAccessPoints();
@@ -32,6 +36,7 @@ public:
     AddStartBridge();
     AddUplink();
     AddRecord();
+    AddLeave();
     AddRemoveBridge();
   }
   SwitchPlan(const SwitchPlan &) = delete;
@@ -47,8 +52,51 @@ private:
     }
   }
 
+  // While the old way out still works: a key that is wrong costs nobody the internet.
+  void AddJoin() {
+    const std::string upstream = snapshot_.upstream;
+    if (snapshot_.to != kClientTopology) {
+      return;
+    }
+    steps_.Add(
+        "join the network outside over " + upstream,
+        [upstream] {
+          Supplicant().Start(upstream);
+          Supplicant::AwaitJoined(upstream);
+        },
+        [this, upstream] {
+          Supplicant().Stop();
+          Restore(upstream);
+        });
+  }
+
+  // Late: until all else is done the way back is there. Where the adapter was pulled out, its supplicant still runs.
+  void AddLeave() {
+    const std::string upstream = snapshot_.upstream;
+    if (snapshot_.from != kClientTopology) {
+      return;
+    }
+    steps_.Add(
+        "leave the network outside",
+        [this, upstream] {
+          Supplicant().Stop();
+          if (!upstream.empty()) {
+            state_.SetDown(upstream);
+          }
+        },
+        [this, upstream] {
+          if (snapshot_.joined) {
+            Supplicant().Start(upstream);
+          }
+          Restore(upstream);
+        });
+  }
+
   void AddReleaseUplink() {
     const std::string uplink = from_.uplink;
+    if (uplink.empty()) {
+      return;
+    }
     const auto &served = snapshot_.dhcpInterfaces;
     const bool wasServed = std::find(served.begin(), served.end(), uplink) != served.end();
     steps_.Add(
@@ -83,7 +131,19 @@ private:
     }
   }
 
+  // A bridge takes its MAC address from its ports unless told one: told its own, it keeps that when the WAN port comes,
+  // and the hosts of the LAN find the router where it was.
+  void AddKeepMac() {
+    const std::string bridge = to_.bridge;
+    if (bridge == from_.bridge && to_.wanInBridge) {
+      steps_.Add(
+          "keep the address of " + bridge,
+          [this, bridge] { netlink_.SetMac(state_.Get(bridge).index, snapshot_.Find(bridge)->link.mac); }, [] {});
+    }
+  }
+
   void AddMovePorts() {
+    AddKeepMac();
     for (const LinkState &port : snapshot_.links) {
       const bool isWan = port.link.name == kWanPort;
       if (isWan || (port.master == from_.bridge && to_.bridge != from_.bridge)) {
@@ -142,8 +202,31 @@ private:
   void AddUplink() {
     const std::string uplink = to_.uplink;
     steps_.Add(
-        "address of " + uplink, [this] { ConnectUplink(netlink_, snapshot_.to, snapshot_.to != kRouterTopology); },
-        [uplink] { DhcpClient(uplink).Stop(); });
+        "address of " + uplink,
+        [this] {
+          ConnectUplink(netlink_, snapshot_.to, to_.uplink, snapshot_.to != kRouterTopology);
+          if (snapshot_.to == kClientTopology) {
+            RefuseOverlap();
+          }
+        },
+        [this, uplink] {
+          DhcpClient(uplink).Stop();
+          state_.Clear(uplink); // its default route would keep the old way out's from coming back
+        });
+  }
+
+  // A network outside with the addresses of the home's own, as is common, would take the home's hosts from the router.
+  void RefuseOverlap() {
+    const std::vector<Address> addresses = netlink_.Addresses();
+    const int uplink = state_.Get(to_.uplink).index;
+    for (const Address &outside : addresses) {
+      for (const Address &inside : addresses) {
+        if (outside.index == uplink && inside.index != uplink && outside.Overlaps(inside)) {
+          throw std::runtime_error("the network outside, " + outside.text + ", has the addresses of our own, " +
+                                   inside.text);
+        }
+      }
+    }
   }
 
   void AddRecord() {
@@ -165,22 +248,20 @@ Result Refuse(const std::string &target, const char *reason) {
   return Result::kFailed;
 }
 
-// @return why the device cannot be in that topology; null when it can
-const char *WhyNot(const std::string &target) {
-  if (target != kClientTopology) {
-    return nullptr;
+// The interface that joins the network outside, before or after the switch.
+// @param[out] why  the device cannot be in that topology; empty when it can
+std::string UpstreamFor(const std::string &current, const std::string &target, std::string &why) {
+  if (target == kClientTopology) {
+    return FindUpstream(why);
   }
-  if (WirelessInterfaces().empty()) {
-    return "no wireless adapter";
-  }
-  return "no upstream network is configured";
+  return current == kClientTopology ? JoinedUpstream() : "";
 }
 
 // What a switch that is killed leaves behind is put back from its snapshot, so that one which could not be read back
 // must not be the ground of a switch.
 // @return why the snapshot cannot be relied on; null when it can
 const char *WhyNotKept(const Snapshot &snapshot) {
-  if (snapshot.Find(kWanPort) == nullptr || snapshot.Find(LayoutOf(snapshot.from).bridge) == nullptr) {
+  if (snapshot.Find(kWanPort) == nullptr || snapshot.Find(LayoutOf(snapshot.from, "").bridge) == nullptr) {
     return "an interface has just gone";
   }
   const std::string text = SnapshotText(snapshot);
@@ -214,9 +295,12 @@ Result CarryOut(Netlink &netlink, const Snapshot &snapshot, TopologyLock &lock) 
 
 } // namespace
 
-Layout LayoutOf(const std::string &topology) {
+Layout LayoutOf(const std::string &topology, const std::string &upstream) {
   if (topology == kBridgeTopology) {
     return {kOneBridge, true, kOneBridge};
+  }
+  if (topology == kClientTopology) { // the WAN port is one more for the home
+    return {kLanBridge, true, upstream};
   }
   return {kLanBridge, false, kWanPort};
 }
@@ -242,15 +326,17 @@ Result SwitchTopology(const std::string &target) {
   }
   if (target == current) {
     if (target != ConfiguredTopology()) { // else the next start would leave it
-      const Layout layout = LayoutOf(target);
+      const Layout layout = LayoutOf(target, "");
       WriteWanBridge(layout.wanInBridge ? layout.bridge : "");
     }
     return Result::kDone;
   }
-  if (const char *reason = WhyNot(target); reason != nullptr) {
-    return Refuse(target, reason);
+  std::string why;
+  const std::string upstream = UpstreamFor(current, target, why);
+  if (!why.empty()) {
+    return Refuse(target, LogText(why).c_str());
   }
-  const Snapshot snapshot = TakeSnapshot(netlink, current, target);
+  const Snapshot snapshot = TakeSnapshot(netlink, current, target, upstream);
   if (const char *reason = WhyNotKept(snapshot); reason != nullptr) {
     return Refuse(target, reason);
   }

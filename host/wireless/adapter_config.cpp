@@ -1,5 +1,6 @@
 #include "host/wireless/adapter_config.h"
 
+#include "host/network/names.h"
 #include "host/packageserver/strict_json.h"
 #include "host/utility/atomic_file.h"
 #include "platform/utility.h"

@@ -9,8 +9,6 @@
 
 namespace vornhost {
 
-constexpr char kWirelessFolder[] = "/etc/vorn/wireless";
-
 constexpr char kPolicyMember[] = "mac_filter_policy";
 constexpr char kListMember[] = "mac_filter_list";
 constexpr char kEnabledMember[] = "enabled";

@@ -4,6 +4,7 @@
 #include "host/network/current_topology.h"
 #include "host/network/names.h"
 #include "host/utility/error.h"
+#include "host/wireless/upstream.h"
 
 #include <unistd.h>
 
@@ -51,8 +52,11 @@ VORN_EXPORT int GetTopologyString(std::string &topology) {
 
 VORN_EXPORT int GetSupportedMode(std::string &mode) {
   return vornhost::Guarded(-1, [&mode] {
-    // What the switch can do: it joins no wireless network, so that "client" is not offered.
     mode = std::string(vornhost::kRouterTopology) + "," + vornhost::kBridgeTopology;
+    std::string ignored;
+    if (!vornhost::FindUpstream(ignored).empty()) { // what the switch would refuse is not offered
+      mode += std::string(",") + vornhost::kClientTopology;
+    }
     return 0;
   });
 }

@@ -121,7 +121,7 @@ TEST_F(Lock, RecoverWithoutOneDoesNothing) {
 TEST_F(Lock, SnapshotOfAnotherBoot) {
   ASSERT_EQ(Run("switch bridge"), 0);
   vornhost::Netlink netlink;
-  vornhost::Snapshot snapshot = vornhost::TakeSnapshot(netlink, "router", "bridge");
+  vornhost::Snapshot snapshot = vornhost::TakeSnapshot(netlink, "router", "bridge", "");
   snapshot.boot = "00000000-0000-0000-0000-000000000000";
   snapshot.wanFile = "DEVICE=eth0\nBOOTPROTO=dhcp\nSLAVE=no\n";
   WriteFile(kLock, vornhost::SnapshotText(snapshot));

@@ -61,6 +61,24 @@ TEST_F(Start, AccessPointsAreInTheConfiguredBridge) {
   EXPECT_EQ(ReadFile(hosttest::kAccessPointFile), "interface=wlan0\nbridge=lbr0\n");
 }
 
+// Its adapter was pulled out, or is found late: the home's own network is there, and the topology can be left.
+TEST_F(Start, ClientWithoutAnAdapterHasItsLanAndCanBeLeft) {
+  const std::string router = Picture();
+  WriteFile(kWanFile, "# the way out\nDEVICE=eth0\nBOOTPROTO=dhcp\nSLAVE=yes\nBRIDGE=lbr0\n");
+  Shell("ip link delete lbr0");
+  EXPECT_EQ(Run("start"), 1);
+  EXPECT_THAT(hosttest::TakeSystemLog(), HasSubstr("no way out in client topology: no wireless adapter"));
+  const std::string client = Picture();
+  EXPECT_THAT(client, HasSubstr("address lbr0 192.168.1.1/24"));
+  EXPECT_THAT(client, Not(HasSubstr("DHCP client on")));
+  for (const char *port : {"eth0", "lan1"}) {
+    EXPECT_THAT(Shell(std::string("ip link show ") + port), HasSubstr("master lbr0")) << port;
+  }
+  EXPECT_THAT(Shell(std::string(hosttest::kProgram) + " status"), HasSubstr("topology:   client\n"));
+  ASSERT_EQ(Run("switch router"), 0);
+  EXPECT_EQ(Picture(), router);
+}
+
 TEST_F(Start, OneMissingPortDoesNotCostTheOthers) {
   Shell("ip link delete lbr0");
   WriteFile(kLanFile, "DEVICE=lbr0\nIPADDR=192.168.1.1\nNETMASK=255.255.255.0\nPORTS=\"lan1 nosuch ../x lan2\"\n");

@@ -1,8 +1,9 @@
 // The topology as the kernel's links tell it, and the device's abilities.
+#include "host/wireless/upstream.h"
 #include "platform/wifi.h"
 #include "tests/host/network/shell.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 
 #include <chrono>
 #include <filesystem>
@@ -21,6 +22,13 @@ std::string Topology() {
   std::string text = "as before";
   const int result = wifi::GetTopologyString(text);
   return result < 0 ? "failed, " + text : text;
+}
+
+// Why the router cannot be a client; empty when it can.
+std::string WhyNoClient() {
+  std::string why;
+  EXPECT_EQ(vornhost::FindUpstream(why), "");
+  return why;
 }
 
 class TopologyText : public testing::Test {
@@ -50,11 +58,10 @@ public:
     fs::create_directories(folder);
     fs::create_symlink("../../../../bus/" + bus, folder + "/subsystem");
   }
-  static void AddWireless(const std::string &name, bool port) {
-    fs::create_directories("/sys/class/net/" + name + "/phy80211");
-    if (port) {
-      fs::create_directories("/sys/class/net/" + name + "/master");
-    }
+  static void AddWireless(const std::string &name) {
+    const std::string radio = "/sys/class/net/" + name + "/phy80211";
+    fs::create_directories(radio);
+    hosttest::WriteFile(radio + "/index", "7\n");
   }
 };
 
@@ -97,14 +104,10 @@ TEST_F(TopologyText, WanPortInAnotherBridgeIsNone) {
   EXPECT_EQ(Topology(), "failed, as before");
 }
 
-TEST_F(TopologyText, WanPortInTheLanBridgeIsClientWithAWirelessUplink) {
+// Also without a radio: what could not be told could not be left.
+TEST_F(TopologyText, WanPortInTheLanBridgeIsClient) {
   MakePorts();
   Shell("ip link set eth0 master lbr0");
-  EXPECT_EQ(Topology(), "failed, as before");
-  const FakeSysfs sysfs;
-  FakeSysfs::AddWireless("wlan0", true); // an access point
-  EXPECT_EQ(Topology(), "failed, as before");
-  FakeSysfs::AddWireless("wlan1", false);
   EXPECT_EQ(Topology(), "client");
 }
 
@@ -179,6 +182,40 @@ TEST_F(TopologyText, BuiltInAdapterIsNoDongle) {
   std::string mode;
   EXPECT_EQ(wifi::GetSupportedMode(mode), 0);
   EXPECT_EQ(mode, "router,bridge"); // not what the switch would refuse
+}
+
+// Over radios that can, and for the switch itself: tests/wifi.
+TEST_F(TopologyText, ConfiguredUpstreamWithoutAUsableRadioIsNoMode) {
+  const FakeSysfs sysfs;
+  FakeSysfs::AddWireless("wlan1");
+  fs::create_directories("/etc/vorn/wireless");
+  const std::string file = "/etc/vorn/wireless/wlan1.upstream";
+  hosttest::WriteFile(file, "network={\n}\n");
+  fs::permissions(file, fs::perms{0644});
+  EXPECT_EQ(WhyNoClient(),
+            file + ": its configuration must be a file that root owns and nobody else can read or write");
+  fs::permissions(file, fs::perms{0600});
+  EXPECT_EQ(WhyNoClient(), file + ": its radio cannot be a station"); // the kernel here knows no such radio
+  fs::create_directories("/etc/hostapd");
+  hosttest::WriteFile("/etc/hostapd/wlan1.conf", "interface=wlan1\n");
+  EXPECT_EQ(WhyNoClient(), file + ": its radio is an access point's");
+  fs::remove("/etc/hostapd/wlan1.conf");
+  fs::create_directories("/sys/class/net/wlan1/master");
+  EXPECT_EQ(WhyNoClient(), file + ": it is a port of a bridge");
+  fs::remove(file);
+  fs::create_symlink("/dev/null", file);
+  EXPECT_EQ(WhyNoClient(),
+            file + ": its configuration must be a file that root owns and nobody else can read or write");
+  fs::rename(file, "/etc/vorn/wireless/wlan7.upstream");
+  EXPECT_EQ(WhyNoClient(), "/etc/vorn/wireless/wlan7.upstream: no wireless interface of that name");
+  FakeSysfs::AddWireless("radio1");
+  fs::rename("/etc/vorn/wireless/wlan7.upstream", "/etc/vorn/wireless/radio1.upstream");
+  EXPECT_THAT(WhyNoClient(), testing::HasSubstr("names begin with \"wl\""));
+  fs::remove("/etc/vorn/wireless/radio1.upstream");
+  EXPECT_EQ(WhyNoClient(), "no upstream network is configured");
+  std::string mode;
+  EXPECT_EQ(wifi::GetSupportedMode(mode), 0);
+  EXPECT_EQ(mode, "router,bridge");
 }
 
 TEST_F(TopologyText, UsbAdapterIsADongle) {
