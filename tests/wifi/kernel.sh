@@ -3,8 +3,10 @@
 # kernel is downloaded and unpacked, not installed: the machine itself boots another one. REQUIRES: $here, this folder.
 # shellcheck disable=SC2154
 
-# The modules: the machine's files (9p) under a layer of memory (overlay), bridges, ciphers of WPA2, simulated radios.
-readonly GUEST_MODULES="virtio_pci 9pnet_virtio 9p overlay bridge ccm cmac ctr mac80211_hwsim"
+# The modules: the machine's files (9p) under a layer of memory (overlay), bridges and cables, the firewall, ciphers of WPA2,
+# simulated radios.
+readonly GUEST_MODULES="virtio_pci 9pnet_virtio 9p overlay bridge veth nf_tables nft_ct nft_masq nft_chain_nat ccm cmac ctr
+  mac80211_hwsim"
 
 kernel_package() { # the archive drops old ones, so that no version is named here
   apt-cache depends linux-image-amd64 2>/dev/null | awk '/Depends: linux-image-/ { print $2; exit }'
@@ -17,7 +19,7 @@ unpack_kernel() { # PACKAGE FOLDER
   mkdir "$folder/files"
   dpkg-deb --fsys-tarfile "$deb" | tar -xf - -C "$folder/files" --wildcards './boot/vmlinuz-*' './lib/modules/*/modules.*' \
     './lib/modules/*/kernel/net/*' './lib/modules/*/kernel/drivers/virtio/*' './lib/modules/*/kernel/fs/9p/*' \
-    './lib/modules/*/kernel/drivers/net/wireless/mac80211_hwsim.ko' './lib/modules/*/kernel/fs/netfs/*' \
+    './lib/modules/*/kernel/drivers/net/wireless/mac80211_hwsim.ko' './lib/modules/*/kernel/drivers/net/veth.ko' './lib/modules/*/kernel/fs/netfs/*' \
     './lib/modules/*/kernel/fs/fscache/*' './lib/modules/*/kernel/fs/overlayfs/*' './lib/modules/*/kernel/crypto/*' \
     './lib/modules/*/kernel/lib/*' './lib/modules/*/kernel/arch/*' || return 1
   rm "$deb"

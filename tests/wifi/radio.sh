@@ -1,5 +1,5 @@
 # shellcheck shell=bash
-# What the checks over simulated radios are made of. REQUIRES: lab/lib/look.sh, $root, $build, $api.
+# What the checks over simulated radios are made of. REQUIRES: lab/lib/look.sh, $root, $build, $api, tests/wifi/outside.sh.
 # shellcheck disable=SC2154,SC2034
 
 readonly PHONE=1 LAPTOP=2 TABLET=3 # the numbers of their radios
@@ -24,26 +24,25 @@ macs_of() { # STATION...: in order, a blank between
 
 prepare_router() {
   local station
-  mkdir -p "$work" /etc/hostapd /var/lib/misc /usr/vorn/sbin
+  mkdir -p "$work" /etc/hostapd /etc/sysconfig/network-scripts /var/lib/misc /usr/vorn/{sbin,share}
   ip link set lo up
-  rm -rf /etc/hostapd/*.conf /etc/vorn/wireless /var/lib/misc/dnsmasq.leases
+  rm -rf /etc/hostapd/*.conf /etc/vorn/wireless /var/lib/misc/dnsmasq.leases /var/lib/vorn
+  install -d -m 700 /var/lib/vorn
+  busybox syslogd -n -O "$work/system.log" &
   # The country would need a database of regulations; without one, the kernel has the channels that all countries permit.
   sed '/^country_code=/d; /^ieee80211d=/d' "$root/packaging/hostapd-wlan0.conf" >/etc/hostapd/wlan0.conf
-  cp "$build/programs/vorntopology" /usr/vorn/sbin/
-  make_bridge lbr0 192.168.1.1/24
-  make_bridge gbr0 192.168.2.1/24
+  cp "$build/programs/vorntopology" "$root/programs/udhcpc.script" /usr/vorn/sbin/
+  cp "$root/programs/base-firewall.nft" /usr/vorn/share/
+  cp "$root"/packaging/ifcfg-* /etc/sysconfig/network-scripts/
+  sed -i 's/^PORTS=.*//' /etc/sysconfig/network-scripts/ifcfg-*
+  prepare_provider
+  /usr/vorn/sbin/vorntopology start || return
   dnsmasq --conf-file="$root/packaging/dnsmasq.conf" --no-ping --user=root --no-resolv --log-facility="$work/dnsmasq.log"
   for station in "$PHONE" "$LAPTOP" "$TABLET"; do
     ip netns add "station$station"
     iw phy "phy$station" set netns name "station$station" # the radio moves; an interface alone could not
     in_station "$station" ip link set lo up
   done
-}
-
-make_bridge() { # NAME ADDRESS
-  ip link add "$1" type bridge
-  ip address add "$2" dev "$1"
-  ip link set "$1" up
 }
 
 start_hostapd() {
@@ -67,10 +66,21 @@ server_answers() {
   call MacFilter 1 get | sed -n 1p | jq -e .success >/dev/null 2>&1
 }
 
+restart_hostapd() {
+  kill -KILL "$hostapd"
+  wait "$hostapd" 2>/dev/null
+  start_hostapd
+}
+
 restart_everything() {
-  kill -KILL "$hostapd" "$server"
-  wait "$hostapd" "$server" 2>/dev/null
-  start_hostapd && start_server
+  kill -KILL "$server"
+  wait "$server" 2>/dev/null
+  restart_hostapd && start_server
+}
+
+# What sees the devices of the home and keeps them.
+start_scanner() {
+  "$build/programs/vorndevices" watch 2>>"$work/scanner.log" &
 }
 
 # ---- stations
@@ -134,20 +144,22 @@ is_rejected() { # STATION
   eventually 40 grep -q CTRL-EVENT-AUTH-REJECT "$work/supplicant$1.log" && ! is_linked "$1"
 }
 
-take_address() { # STATION
+take_address() { # STATION ADDRESS-PATTERN
   cat >"$work/udhcpc.script" <<'SCRIPT'
 #!/bin/sh
-[ "$1" = bound ] && ip address replace "$ip/$mask" dev "$interface"
-exit 0
+[ "$1" = bound ] || exit 0
+ip -4 address flush dev "$interface"
+ip address add "$ip/$mask" dev "$interface"
+ip route replace default via "$router"
 SCRIPT
   chmod 755 "$work/udhcpc.script"
   in_station "$1" busybox udhcpc -i "wlan$1" -n -q -t 10 -T 2 -x "hostname:device$1" -s "$work/udhcpc.script" \
     >/dev/null 2>&1 || return 1
-  in_station "$1" ip -4 -o address show dev "wlan$1" | grep -q 'inet 192\.168\.'
+  in_station "$1" ip -4 -o address show dev "wlan$1" | grep -q "inet $2"
 }
 
-ping_router() { # STATION
-  in_station "$1" busybox ping -q -c 5 -W 3 192.168.1.1 >/dev/null
+reaches() { # STATION ADDRESS
+  in_station "$1" busybox ping -q -c 2 -W 3 "$2" >/dev/null
 }
 
 # The laptop of a neighbour, who guesses.
@@ -208,4 +220,44 @@ filter_is() { # POLICY LIST
   jq -e --arg policy "$1" --argjson list "$2" \
     '.success and .data == {mac_filter_policy: $policy, mac_filter_list: $list}' <<<"$answer" >/dev/null ||
     { echo "# get: $answer" >&2; return 1; }
+}
+
+# ---- what the API tells of them
+
+online() { # NETRANGE
+  call ConnectionList 1 getcount "{\"scannertype\": \"all\", \"netrange\": \"$1\"}" | sed -n 1p | jq .data.devicecount
+}
+
+are_counted() { # ALL LOCAL GUEST
+  [ "$1 $2 $3" = "$(online all) $(online local) $(online guest)" ]
+}
+
+listing_ended() {
+  listing=$(call ConnectionList 1 get | sed -n 1p)
+  jq -e '.data.finish' <<<"$listing" >/dev/null
+}
+
+# The task that looks at the network now.
+lists_stations() {
+  eventually 60 listing_ended && told_over_api "$listing" '192\.168\.1\.' '192\.168\.2\.' "$PHONE" "$LAPTOP" "$TABLET"
+}
+
+# An answer of "get" lists these stations and no others, each with what the air tells of it.
+told_over_api() { # ANSWER HOME-PATTERN GUEST-PATTERN STATION...
+  local wanted
+  wanted=$(macs_of "${@:4}")
+  jq -e --arg wanted "$wanted" --arg home "^$2" --arg guest "^$3" --arg tablet "$(station_mac "$TABLET")" '
+    .success and ([.data.stations[].mac] | sort | join(" ")) == $wanted and
+    (.data.stations | all(.connection == "wifi" and .status and .signalstrength < 0 and .signalstrength > -100 and
+      .transferRX > 100 and .transferTX > 100 and (.hostname | test("^device[123]$")) and
+      (.mac as $mac | .ip | test(if $mac == $tablet then $guest else $home end))))' <<<"$1" >/dev/null ||
+    { echo "$1" >&2; return 1; }
+}
+
+# What the scanner has found and kept, one kind of network at a time; each station under the bridge of its network.
+store_lists() { # NETRANGE BRIDGE STATION...
+  local answer
+  answer=$(call ConnectionList 1 get "{\"scannertype\": \"all\", \"netrange\": \"$1\"}" | sed -n 1p)
+  told_over_api "$answer" '192\.168\.1\.' '192\.168\.2\.' "${@:3}" &&
+    same "$2" "$(jq -r '[.data.stations[].netif] | unique | join(" ")' <<<"$answer")"
 }

@@ -7,7 +7,7 @@ set -uo pipefail
 here=$(cd "${BASH_SOURCE[0]%/*}" && pwd -P)
 . "$here/kernel.sh"
 build=${VORN_BUILD:?"set VORN_BUILD to the build folder"}
-readonly SECONDS_LIMIT=${VORN_RADIO_SECONDS:-330} # a loaded machine needs several times the half minute of an idle one
+readonly SECONDS_LIMIT=${VORN_RADIO_SECONDS:-900} # a loaded machine needs several times the minutes of an idle one
 
 skip() { # REASON
   echo "SKIP: $1"
@@ -30,9 +30,9 @@ grep -q '^VORN_SANITIZE:[A-Z]*=.' "$build/CMakeCache.txt" && memory=1024
 # Not "-machine microvm", whose boot hangs now and then, and not KVM, which is not to be had everywhere.
 timeout -k 5 "$SECONDS_LIMIT" qemu-system-x86_64 -nodefaults -no-user-config -display none -no-reboot -machine q35 \
   -accel tcg,tb-size=128 -cpu max -smp 1 -m "$memory" -kernel "$kernel/vmlinux" -initrd "$kernel/initrd.gz" \
-  -append "console=ttyS0 quiet panic=-1 mitigations=off radios=4 checks=$here/checks.sh build=$build" -serial stdio \
+  -append "console=ttyS0 quiet panic=-1 mitigations=off radios=6 checks=$here/checks.sh build=$build" -serial stdio \
   -fsdev local,id=host,path=/,security_model=none,readonly=on,multidevs=remap -device virtio-9p-pci,fsdev=host,mount_tag=host \
-  -fsdev local,id=out,path="$out",security_model=none -device virtio-9p-pci,fsdev=out,mount_tag=out </dev/null | tr -d '\r'
+  -fsdev local,id=out,path="$out",security_model=none -device virtio-9p-pci,fsdev=out,mount_tag=out </dev/null | sed -u 's/\r//g'
 
 status=$(cat "$out/status" 2>/dev/null) || { echo "FAIL the checks did not come to their end"; exit 1; }
 exit "$status"
