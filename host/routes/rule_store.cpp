@@ -5,19 +5,16 @@
 #include "host/routes/route_rule.h"
 #include "host/utility/atomic_file.h"
 #include "host/utility/file_turn.h"
+#include "host/utility/folder.h"
 #include "host/utility/line_file.h"
 #include "platform/utility.h"
 
-#include <fcntl.h>
 #include <json/writer.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <chrono>
-#include <cstring>
 #include <stdexcept>
 
 namespace vornhost {
@@ -42,23 +39,9 @@ std::string ReadOrEmpty(const std::string &path) {
   return content;
 }
 
-// A folder that is made is on the disk before something is put into it.
-void MakeFolder(const std::string &path) {
-  if (mkdir(path.c_str(), 0755) != 0) {
-    if (errno != EEXIST) {
-      Fail(path, std::strerror(errno));
-    }
-    return;
-  }
-  const UniqueFd parent(open(path.substr(0, path.rfind('/')).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!parent.IsOpen() || fsync(parent.Get()) != 0) {
-    Fail(path, std::strerror(errno));
-  }
-}
-
 void Write(const std::string &path, const std::string &content) {
-  MakeFolder("/etc/iproute2");
-  MakeFolder(kFolder);
+  MakeFolder("/etc/iproute2", 0755);
+  MakeFolder(kFolder, 0755);
   const auto render = [&content](const std::string &, std::string &fresh) {
     fresh = content;
     return 0;
