@@ -35,20 +35,22 @@ std::string NameOf(const Json::Value &adapter) {
   return router::ConvertToText(adapter).value_or("");
 }
 
-// @return the entries of a list, an array, with the members that an entry has: null where one lacks it
-Json::Value EntriesOf(const Json::Value &list) {
-  Json::Value entries(Json::arrayValue);
-  if (!list.isArray()) {
-    return entries;
-  }
-  for (const Json::Value &element : list) {
-    Json::Value entry;
-    for (const char *member : {"mac_filter_enabled", "desc", "mac"}) {
-      entry[member] = router::MemberOf(element, member);
+// Appends a list's entries with the members that an entry has, null where one lacks it. What is no array has no
+// entries: the members of an object, which JsonCpp would go through too, are none. REQUIRES: `out` is an array or null;
+// it is an array afterwards.
+void AppendEntries(const Json::Value &list, Json::Value &out) {
+  if (list.isArray()) {
+    for (const Json::Value &element : list) {
+      Json::Value entry;
+      for (const char *member : {"mac_filter_enabled", "desc", "mac"}) {
+        entry[member] = router::MemberOf(element, member);
+      }
+      out.append(entry);
     }
-    entries.append(entry);
   }
-  return entries;
+  if (out.isNull()) {
+    out = Json::Value(Json::arrayValue);
+  }
 }
 
 } // namespace
@@ -65,7 +67,7 @@ bool MacFilterHandler::GetRules(Json::Value &out) {
   } else {
     ROUTER_LOG("%s:%d Failed to get Adapter config");
   }
-  out[kList] = EntriesOf(read ? router::MemberOf(config, kList) : Json::Value::nullSingleton());
+  AppendEntries(read ? router::MemberOf(config, kList) : Json::Value::nullSingleton(), out[kList]);
   return read;
 }
 
@@ -96,7 +98,8 @@ bool MacFilterHandler::SetAdapterConfig(const Json::Value &data) {
   if (!ListAdapters(client, adapters)) {
     return false;
   }
-  const Json::Value list = EntriesOf(router::MemberOf(data, kList));
+  Json::Value list;
+  AppendEntries(router::MemberOf(data, kList), list);
   for (const Json::Value &adapter : adapters) {
     const std::string name = NameOf(adapter);
     Json::Value config;

@@ -12,8 +12,9 @@ public:
   MacFilterHandler();
   ~MacFilterHandler();
 
-  /// @param[out] out  object: "mac_filter_policy" and "mac_filter_list", an array of objects "mac", "desc" and
-  ///                  "mac_filter_enabled"; without the policy, and with an empty list, on failure
+  /// @param[in,out] out  object or null: gets "mac_filter_policy" and, at the end of "mac_filter_list" (an array, made
+  ///                     when there is none), objects "mac", "desc" and "mac_filter_enabled"; on failure nothing but
+  ///                     the list where there is none
   bool GetRules(Json::Value &out);
 
   /// @param[out] config  the first adapter's whole configuration

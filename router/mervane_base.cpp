@@ -281,7 +281,7 @@ void SetMacFilter(APIRequest *request, APIResponse *response) {
   MacFilterHandler filter;
   if (request->HasParam("mac_filter_policy")) {
     const auto policy = router::ConvertToText(request->GetParam("mac_filter_policy", Json::Value()));
-    if (!policy) {
+    if (!policy) { // an array or an object, of which JsonCpp makes no text: no policy of any daemon
       response->SetError(kErrorFailed, parameters);
       return;
     }

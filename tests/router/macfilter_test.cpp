@@ -5,6 +5,8 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
+
 using scripted::Exchange;
 using scripted::Get;
 using scripted::Parse;
@@ -20,6 +22,8 @@ constexpr char kEmptyList[] = "macfilter: Error on Adapter list is empty";
 constexpr char kFirst[] = "macfilter: Error on getting first Adapter config";
 constexpr char kNoConfig[] = "macfilter: Failed to get Adapter config";
 constexpr char kNoWrite[] = "macfilter: Failed on writeback Adapter config";
+constexpr char kParse[] = "mervane_base: Error when parsing array, msg: ";
+constexpr char kNoArray[] = "mervane_base: Data mac filter list from req is not an json array";
 constexpr char kNothing[] = R"(SetError(4300, {"mac_filter_list":[]}))";
 
 class MacFilterTest : public testing::Test {
@@ -142,6 +146,32 @@ TEST_F(MacFilterTest, Get_UnreadableFirstAdapterAnswers4300WithAnEmptyListAndTri
   EXPECT_THAT(Get().log, ElementsAre(kFirst, kNoConfig));
 }
 
+TEST_F(MacFilterTest, Get_FirstAdapterNameThatIsNoTextNamesNone) {
+  for (const char *adapters : {R"([{"name":"wlan0"},"wlan1"])", R"([["wlan0"],"wlan1"])", R"([null,"wlan1"])"}) {
+    scripted::Reset();
+    Get().adapters = Parse(adapters);
+    Get().adapterConfigs["wlan1"] = Parse("{}");
+    EXPECT_EQ(GetAnswer(), kNothing) << adapters;
+    EXPECT_THAT(CallsOf("GetAdapterConfig"), ElementsAre("GetAdapterConfig(, null)"));
+    EXPECT_THAT(Get().log, ElementsAre(kFirst, kNoConfig));
+  }
+}
+
+TEST_F(MacFilterTest, GetRules_AppendsToAListThatIsThereAndKeepsItOnFailure) {
+  Get().adapterConfigs["wlan0"] = Parse(R"({"mac_filter_policy":"deny","mac_filter_list":[{"mac":"b"}]})");
+  Json::Value out = Parse(R"({"mac_filter_list":["a"],"other":1})");
+  EXPECT_TRUE(MacFilterHandler().GetRules(out));
+  const char *appended = R"({"mac_filter_list":["a",{"desc":null,"mac":"b","mac_filter_enabled":null}],)"
+                         R"("mac_filter_policy":"deny","other":1})";
+  EXPECT_EQ(scripted::Text(out), appended);
+  Get().serverReady = false;
+  EXPECT_FALSE(MacFilterHandler().GetRules(out));
+  EXPECT_EQ(scripted::Text(out), appended);
+  Json::Value fresh;
+  EXPECT_FALSE(MacFilterHandler().GetRules(fresh));
+  EXPECT_EQ(scripted::Text(fresh), R"({"mac_filter_list":[]})");
+}
+
 TEST_F(MacFilterTest, Set_WritesTheSameFilterToEveryAdapterAndKeepsTheOtherKeys) {
   const std::string answer =
       SetAnswer(Parameters("deny", R"([{"mac":"02:00:00:00:01:00","desc":"tv","mac_filter_enabled":true,"vlan":3}])"));
@@ -157,6 +187,16 @@ TEST_F(MacFilterTest, Set_WritesTheSameFilterToEveryAdapterAndKeepsTheOtherKeys)
                           "GetAdapterConfig(wlan2, null)", "ApplyAdapter(wlan2, {" + filter + "})", "~WifiClient()",
                           answer));
   EXPECT_THAT(Get().log, IsEmpty());
+}
+
+TEST_F(MacFilterTest, Set_UnknownKeysOfEntriesAreNotPassedOn) {
+  Get().adapters = Parse(R"(["wlan2"])");
+  EXPECT_EQ(SetAnswer(Parameters("deny", R"([{"vlan":3,"mac":"a","Mac":"b","desc":{"x":1}},{"name":"tv"}])")),
+            "SetSuccess(null)");
+  EXPECT_THAT(CallsOf("ApplyAdapter"),
+              ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[)"
+                          R"({"desc":{"x":1},"mac":"a","mac_filter_enabled":null},)"
+                          R"({"desc":null,"mac":null,"mac_filter_enabled":null}],"mac_filter_policy":"deny"}))"));
 }
 
 TEST_F(MacFilterTest, Set_WithoutEitherParameterWritesANullPolicyAndAnEmptyList) {
@@ -192,7 +232,9 @@ TEST_F(MacFilterTest, Set_AllAdaptersSkippedIsSuccessToo) {
   Get().adapterConfigs.clear();
   EXPECT_EQ(SetAnswer(Parameters("allow", "[]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("ApplyAdapter"), IsEmpty());
-  EXPECT_EQ(Get().log.size(), 3U);
+  EXPECT_THAT(Get().log, ElementsAre("macfilter: Error on getting Adapter config from [wlan0], skip it",
+                                     "macfilter: Error on getting Adapter config from [wlan1], skip it",
+                                     "macfilter: Error on getting Adapter config from [wlan2], skip it"));
 }
 
 TEST_F(MacFilterTest, Set_ConfigurationThatIsNoObjectIsSkipped) {
@@ -201,13 +243,19 @@ TEST_F(MacFilterTest, Set_ConfigurationThatIsNoObjectIsSkipped) {
   EXPECT_EQ(SetAnswer(Parameters("allow", "[]")), "SetSuccess(null)");
   EXPECT_THAT(CallsOf("ApplyAdapter"),
               ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[],"mac_filter_policy":"allow"}))"));
+  EXPECT_THAT(Get().log, ElementsAre("macfilter: Error on getting Adapter config from [wlan0], skip it",
+                                     "macfilter: Error on getting Adapter config from [wlan1], skip it"));
 }
 
 TEST_F(MacFilterTest, Set_FailureOnTheSecondAdapterKeepsTheFirstAndLeavesTheThird) {
   Get().applyResults["wlan1"] = -1;
   EXPECT_EQ(SetAnswer(Parameters("deny", R"([{"mac":"a","vlan":3}])")),
             R"(SetError(4300, {"mac_filter_list":[{"mac":"a","vlan":3}],"mac_filter_policy":"deny"}))");
-  EXPECT_THAT(CallsOf("ApplyAdapter"), ElementsAre(HasSubstr("wlan0"), HasSubstr("wlan1")));
+  const std::string filter = R"("mac_filter_list":[{"desc":null,"mac":"a","mac_filter_enabled":null}],)"
+                             R"("mac_filter_policy":"deny")";
+  EXPECT_THAT(CallsOf("ApplyAdapter"),
+              ElementsAre(R"(ApplyAdapter(wlan0, {"channel":6,"enabled":true,)" + filter + "})",
+                          "ApplyAdapter(wlan1, {" + filter + R"(,"ssid":"five"}))"));
   EXPECT_THAT(CallsOf("GetAdapterConfig"),
               ElementsAre("GetAdapterConfig(wlan0, null)", "GetAdapterConfig(wlan1, null)"));
   EXPECT_THAT(Get().log, ElementsAre(kFirst, kNoWrite));
@@ -223,12 +271,25 @@ TEST_F(MacFilterTest, Set_DaemonNotReadyAnswers4300WithTheParameters) {
 }
 
 TEST_F(MacFilterTest, Set_AdapterListThatFailsOrIsEmptyAnswers4300) {
+  const char *refused = R"(SetError(4300, {"mac_filter_policy":"deny"}))";
+  const std::vector<std::string> asked = {"WifiClient()", "IsServerReady()", "GetAdapterList(null)", "~WifiClient()",
+                                          refused};
+  const auto afterTheParameters = [] {
+    auto calls = Get().calls;
+    calls.erase(calls.begin(), std::find(calls.begin(), calls.end(), "WifiClient()"));
+    return calls;
+  };
   Get().results["GetAdapterList(null)"] = -1;
-  EXPECT_EQ(SetAnswer(Parameters("deny", nullptr)), R"(SetError(4300, {"mac_filter_policy":"deny"}))");
-  Get().results.clear();
-  Get().adapters = Parse(R"({"0":"wlan0"})");
-  EXPECT_EQ(SetAnswer(Parameters("deny", nullptr)), R"(SetError(4300, {"mac_filter_policy":"deny"}))");
-  EXPECT_THAT(Get().log, ElementsAre(kNoList, kNoWrite, kEmptyList, kNoWrite));
+  EXPECT_EQ(SetAnswer(Parameters("deny", nullptr)), refused);
+  EXPECT_EQ(afterTheParameters(), asked);
+  EXPECT_THAT(Get().log, ElementsAre(kNoList, kNoWrite));
+  for (const char *adapters : {"[]", R"({"0":"wlan0"})", "null"}) {
+    scripted::Reset();
+    Get().adapters = Parse(adapters);
+    EXPECT_EQ(SetAnswer(Parameters("deny", nullptr)), refused) << adapters;
+    EXPECT_EQ(afterTheParameters(), asked) << adapters;
+    EXPECT_THAT(Get().log, ElementsAre(kEmptyList, kNoWrite)) << adapters;
+  }
 }
 
 TEST_F(MacFilterTest, Set_AdapterNameThatIsNoTextNamesNone) {
@@ -242,29 +303,69 @@ TEST_F(MacFilterTest, Set_ListThatIsNoJsonAnswers4300WithNullAndAsksNobody) {
     scripted::Reset();
     EXPECT_EQ(SetAnswer(Parameters("deny", list)), "SetError(4300, null)") << list;
     EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());
-    EXPECT_THAT(Get().log, ElementsAre(HasSubstr("mervane_base: Error when parsing array, msg: "))) << list;
+    EXPECT_THAT(Get().log, ElementsAre(HasSubstr(kParse))) << list;
   }
 }
 
 TEST_F(MacFilterTest, Set_ListThatIsNoTextAnswers4300WithNull) {
   for (const char *list : {"[]", "{}", R"([{"mac":"a"}])"}) {
+    scripted::Reset();
     Json::Value parameters = Parameters("deny", nullptr);
     parameters["mac_filter_list"] = Parse(list);
     EXPECT_EQ(SetAnswer(parameters), "SetError(4300, null)") << list;
+    EXPECT_THAT(Get().log, ElementsAre(std::string(kParse) + "no text"));
+    EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());
   }
+}
+
+// A number, a boolean and null are taken for their texts; that of null is empty.
+TEST_F(MacFilterTest, Set_ListThatIsANumberAnswers4300WithIt) {
+  for (const char *list : {"5", "true"}) {
+    scripted::Reset();
+    Json::Value parameters = Parameters("deny", nullptr);
+    parameters["mac_filter_list"] = Parse(list);
+    EXPECT_EQ(SetAnswer(parameters), std::string("SetError(4300, ") + list + ")");
+    EXPECT_THAT(Get().log, ElementsAre(kNoArray));
+    EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());
+  }
+  scripted::Reset();
+  Json::Value parameters = Parameters("deny", nullptr);
+  parameters["mac_filter_list"] = Json::Value();
+  EXPECT_EQ(SetAnswer(parameters), "SetError(4300, null)");
+  EXPECT_THAT(Get().log, ElementsAre(HasSubstr(kParse)));
+  EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());
 }
 
 TEST_F(MacFilterTest, Set_JsonThatIsNoArrayAnswers4300WithIt) {
-  for (const char *list : {R"({"mac":"a"})", "{}", "7", R"("text")", "true", "null"}) {
+  for (const char *list : {R"({"mac":"a"})", "{}", "5", "null", R"("x")", "true"}) {
     scripted::Reset();
     EXPECT_EQ(SetAnswer(Parameters("deny", list)), std::string("SetError(4300, ") + list + ")");
     EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());
-    EXPECT_THAT(Get().log, ElementsAre("mervane_base: Data mac filter list from req is not an json array"));
+    EXPECT_THAT(Get().log, ElementsAre(kNoArray));
   }
 }
 
+TEST_F(MacFilterTest, Set_WhatFollowsTheArrayIsPassedOver) {
+  Get().adapters = Parse(R"(["wlan2"])");
+  EXPECT_EQ(SetAnswer(Parameters("deny", "[] rubbish")), "SetSuccess(null)");
+  EXPECT_THAT(CallsOf("ApplyAdapter"),
+              ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[],"mac_filter_policy":"deny"}))"));
+}
+
 TEST_F(MacFilterTest, Set_ListNestedTooDeeplyIsNoJson) {
-  EXPECT_EQ(SetAnswer(Parameters("deny", std::string(100000, '[').c_str())), "SetError(4300, null)");
+  for (const size_t depth : {65U, 100000U}) {
+    scripted::Reset();
+    EXPECT_EQ(SetAnswer(Parameters("deny", (std::string(depth, '[') + std::string(depth, ']')).c_str())),
+              "SetError(4300, null)");
+    EXPECT_THAT(Get().log, ElementsAre(std::string(kParse) + "nested too deeply"));
+    EXPECT_THAT(CallsOf("WifiClient"), IsEmpty());
+  }
+  scripted::Reset();
+  Get().adapters = Parse(R"(["wlan2"])");
+  Get().adapterConfigs["wlan2"] = Parse("{}");
+  EXPECT_EQ(SetAnswer(Parameters("deny", (std::string(64, '[') + std::string(64, ']')).c_str())), "SetSuccess(null)");
+  EXPECT_THAT(CallsOf("ApplyAdapter"), ElementsAre(R"(ApplyAdapter(wlan2, {"mac_filter_list":[{"desc":null,"mac":null,)"
+                                                   R"("mac_filter_enabled":null}],"mac_filter_policy":"deny"}))"));
 }
 
 TEST_F(MacFilterTest, Set_PolicyIsTakenAsText) {
