@@ -40,9 +40,11 @@ public:
   /// over. "mac_filter_policy" is "disable" (everyone may connect), "allow" (only the list's entries) or "deny" (all
   /// but them), for the main and the guest network; an entry is an object: "mac" (a station's MAC address), "desc" (a
   /// text or null), "mac_filter_enabled" (a boolean; null or missing: true). A station that the filter forbids loses
-  /// its connection at once.
+  /// its connection at once. Waits for the daemon at most 4 seconds: 2 for the change, 2 to take it back when it fails.
   /// @retval >=0  stored, durably, and applied
-  /// @retval <0   no such adapter, a value that is not acceptable (nothing is written), or it could not be applied
+  /// @retval <0   no such adapter, a value that is not acceptable or a daemon that does not answer (nothing is
+  /// changed),
+  ///              or it could not be applied (what is stored is as it was; the daemon too, if it lets itself be told)
   int ApplyAdapter(const std::string &adapter, const Json::Value &config);
 
   /// The stations of one wireless network.

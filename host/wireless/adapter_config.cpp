@@ -39,6 +39,9 @@ std::string RenderAdapterConfig(Json::Value config) {
   builder["indentation"] = "\t";
   builder["emitUTF8"] = true; // bytes as they are, so that what is no UTF-8 is found
   std::string text = Json::writeString(builder, config) + "\n";
+  if (text.size() > kFileLimit) {
+    throw std::runtime_error("a configuration that is too large");
+  }
   Json::Value back;
   if (!ParseStrictJson(text, back) || Json::writeString(builder, back) + "\n" != text) {
     throw std::runtime_error("a configuration that cannot be stored as it is");

@@ -23,8 +23,7 @@ constexpr char kPolicyDeny[] = "deny";       // all but the entries may
 Json::Value ReadAdapterConfig(const std::string &adapter);
 
 /// @return a configuration as it is stored, without the members that say what is on the air. Throws std::runtime_error
-/// when
-///         reading it would not give it back: a text that is no UTF-8, a nesting that is too deep.
+/// when reading it would not give it back: a text that is no UTF-8, a nesting that is too deep, more than a file holds.
 std::string RenderAdapterConfig(Json::Value config);
 
 /// The path of an adapter's file.

@@ -1,25 +1,34 @@
 #include "host/wireless/adapter_writer.h"
 
 #include "host/network/names.h"
-#include "host/utility/line_file.h"
+#include "host/utility/atomic_file.h"
+#include "host/utility/folder.h"
 #include "host/utility/log.h"
 #include "host/wireless/adapter_config.h"
 #include "host/wireless/control_socket.h"
 #include "host/wireless/file_changes.h"
 #include "host/wireless/mac_filter.h"
+#include "host/wireless/network_acl.h"
 #include "host/wireless/stations.h"
 #include "platform/utility.h"
 
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <chrono>
 #include <set>
 #include <stdexcept>
+#include <string>
 #include <utility>
+#include <vector>
 
 namespace vornhost {
 
 namespace {
+
+// What a change that failed may take beyond kAnswerLimit, to be taken back.
+constexpr std::chrono::milliseconds kUndoLimit{1500};
+constexpr std::chrono::milliseconds kLastWordLimit{500};
 
 struct FilterFiles {
   std::string accept;
@@ -33,16 +42,6 @@ FilterFiles FilterFilesOf(const std::string &adapter) {
 
 int MacaddrAclOf(const MacFilter &filter) {
   return filter.policy == FilterPolicy::kAllow ? 1 : 0;
-}
-
-bool IsFilterLine(std::string_view line) {
-  const std::string_view key = line.substr(0, line.find('='));
-  return key == "macaddr_acl" || key == "accept_mac_file" || key == "deny_mac_file";
-}
-
-bool BeginsNetwork(std::string_view line) {
-  const std::string_view key = line.substr(0, line.find('='));
-  return key == "interface" || key == "bss";
 }
 
 void WriteList(const MacFilter &filter, FilterPolicy which, const FilterFiles &files, FileChanges &changes) {
@@ -84,21 +83,6 @@ void WriteFiles(const WirelessAdapter &adapter, const MacFilter &filter, const s
   changes.Replace(AdapterFileOf(adapter.name), [&config](const std::string &) { return config; });
 }
 
-// hostapd takes the lists from the files in one request each, however long they are. While they are empty everybody is
-// let in (with macaddr_acl 1 hostapd would throw everybody out); who came in then is thrown out with the others. The
-// removal of an address that is in no list makes hostapd hand the lists to a driver that filters by itself.
-bool TellLists(ControlSocket &control, const FilterFiles &files, int macaddrAcl) {
-  const std::string requests[] = {"SET macaddr_acl 0",
-                                  "ACCEPT_ACL CLEAR",
-                                  "DENY_ACL CLEAR",
-                                  "SET accept_mac_file " + files.accept,
-                                  "SET deny_mac_file " + files.deny,
-                                  "SET macaddr_acl " + std::to_string(macaddrAcl),
-                                  "DENY_ACL DEL_MAC 00:00:00:00:00:00"};
-  return std::all_of(std::begin(requests), std::end(requests),
-                     [&control](const std::string &request) { return control.Do(request); });
-}
-
 // Deauthenticated, not only disassociated: an authenticated station could associate again without being looked up.
 bool ThrowOut(ControlSocket &control, const MacFilter &filter) {
   const auto stations = ListStations(control);
@@ -110,25 +94,69 @@ bool ThrowOut(ControlSocket &control, const MacFilter &filter) {
   });
 }
 
-void TellHostapd(const WirelessAdapter &adapter, const MacFilter &filter, Deadline deadline) {
-  const FilterFiles files = FilterFilesOf(adapter.name);
+// A network with what its hostapd had before a change.
+struct OldNetwork {
+  const WirelessNetwork *network;
+  NetworkAcl acl;
+};
+
+// What the running hostapd has is what it read when it started: it does not tell. An owner's own lines count too.
+std::vector<OldNetwork> ReadOldNetworks(const WirelessAdapter &adapter) {
+  std::vector<OldNetwork> networks;
+  for (const WirelessNetwork &network : adapter.networks) {
+    std::string content;
+    if (ReadWholeFile(network.file.c_str(), content) != 0) {
+      throw std::runtime_error(network.file + ": cannot be read");
+    }
+    networks.push_back({&network, ParseNetworkAcl(content, network.name)});
+  }
+  return networks;
+}
+
+// Before anything is changed, so that one that hangs is not left with a filter that is changed when it goes on.
+void CheckAnswers(const WirelessAdapter &adapter, Deadline deadline) {
   for (const WirelessNetwork &network : adapter.networks) {
     ControlSocket control(network.control, deadline);
+    if (!control.IsAbsent() && !Answers(control)) {
+      throw std::runtime_error(network.name + ": hostapd does not answer");
+    }
+  }
+}
+
+// @param[out] told  how many networks were told something
+void TellHostapd(const WirelessAdapter &adapter, const MacFilter &filter, Deadline deadline, size_t &told) {
+  const FilterFiles files = FilterFilesOf(adapter.name);
+  const NetworkAcl acl{std::to_string(MacaddrAclOf(filter)), {files.accept}, {files.deny}};
+  for (const WirelessNetwork &network : adapter.networks) {
+    ControlSocket control(network.control, deadline);
+    ++told;
     if (control.IsAbsent()) {
       continue;
     }
-    if (!TellLists(control, files, MacaddrAclOf(filter)) || !ThrowOut(control, filter)) {
+    if (!TellAcl(control, acl) || !ThrowOut(control, filter)) {
       throw std::runtime_error(network.name + ": hostapd does not take the MAC filter");
     }
   }
 }
 
-// What hostapd was told before, as far as it can be said.
-MacFilter StoredFilter(const std::string &adapter) {
-  try {
-    return ParseMacFilter(ReadAdapterConfig(adapter));
-  } catch (const std::runtime_error &) {
-    return {};
+// REQUIRES: the old files are back. The network that failed is the last, so that the others have their lists before it
+// can use the time up. One that answers but does not take its lists has the old policy as the last word: a network with
+// a list of those who may connect stays shut; one without it is open to those it denied, but not shut to the home.
+void TellOldFilter(std::vector<OldNetwork> networks) {
+  const Deadline deadline = std::chrono::steady_clock::now() + kUndoLimit;
+  const auto isRestored = [](const OldNetwork &old, Deadline until, bool (*tell)(ControlSocket &, const NetworkAcl &)) {
+    ControlSocket control(old.network->control, until);
+    return control.IsAbsent() || (Answers(control) && tell(control, old.acl));
+  };
+  networks.erase(
+      std::remove_if(networks.begin(), networks.end(),
+                     [&isRestored, deadline](const OldNetwork &old) { return isRestored(old, deadline, TellAcl); }),
+      networks.end());
+  const Deadline last = std::chrono::steady_clock::now() + kLastWordLimit;
+  for (const OldNetwork &old : networks) {
+    const char *left =
+        isRestored(old, last, TellPolicy) ? "the old policy without its lists" : "a part of a MAC filter";
+    LogError("%s: hostapd has %s until it is told again or started again", old.network->name.c_str(), left);
   }
 }
 
@@ -142,44 +170,26 @@ void CheckSockets(const WirelessAdapter &adapter) {
 
 } // namespace
 
-std::string WithFilterLines(std::string_view content, const std::string &acceptFile, const std::string &denyFile,
-                            int macaddrAcl) {
-  const std::string added = "macaddr_acl=" + std::to_string(macaddrAcl) + "\naccept_mac_file=" + acceptFile +
-                            "\ndeny_mac_file=" + denyFile + "\n";
-  std::string out;
-  LineReader lines(content);
-  for (std::string_view line; lines.Next(line);) {
-    if (IsFilterLine(line)) {
-      continue;
-    }
-    out.append(line).append("\n");
-    if (BeginsNetwork(line)) {
-      out += added;
-    }
-  }
-  return out;
-}
-
 void WriteAdapter(const WirelessAdapter &adapter, const Json::Value &config) {
   const MacFilter filter = ParseMacFilter(config);
   const std::string text = RenderAdapterConfig(config);
   CheckSockets(adapter);
-  mkdir("/etc/vorn", 0755);
-  mkdir(kWirelessFolder, 0700); // who is in a list is nobody's business
+  MakeFolder("/etc/vorn", 0755);
+  MakeFolder(kWirelessFolder, 0700); // who is in a list is nobody's business
   const UniqueFd turn = TakeHostapdTurn();
-  const MacFilter before = StoredFilter(adapter.name);
+  std::vector<OldNetwork> before = ReadOldNetworks(adapter);
   const Deadline deadline = std::chrono::steady_clock::now() + kAnswerLimit;
+  CheckAnswers(adapter, deadline);
+  const auto left = deadline - std::chrono::steady_clock::now(); // the disk's time is not hostapd's
   FileChanges changes;
+  size_t told = 0;
   try {
     WriteFiles(adapter, filter, text, changes);
-    TellHostapd(adapter, filter, deadline);
+    TellHostapd(adapter, filter, std::chrono::steady_clock::now() + left, told);
   } catch (...) {
     changes.Undo();
-    try {
-      TellHostapd(adapter, before, deadline);
-    } catch (const std::runtime_error &error) {
-      LogError("the old MAC filter is not applied: %s", LogText(error.what()).c_str());
-    }
+    before.resize(told);
+    TellOldFilter(std::move(before));
     throw;
   }
 }

@@ -17,7 +17,8 @@ namespace vornhost {
 
 using Deadline = std::chrono::steady_clock::time_point;
 
-/// The longest that one call of the contract waits for hostapd, all its requests together.
+/// The longest that one call of the contract waits for hostapd, all its requests together. A change that failed has as
+/// much time again to be taken back.
 constexpr std::chrono::milliseconds kAnswerLimit{2000};
 
 class ControlSocket {

@@ -95,6 +95,19 @@ check "the laptop does not" is_rejected "$LAPTOP"
 check "nor does the guest" is_rejected "$TABLET"
 check "the phone alone is listed" same "$(macs_of "$PHONE")/" "$(listed wlan0)/$(listed gwlan0)"
 
+: >"$work/supplicant$PHONE.log"
+both='[{"mac":"02:00:00:00:01:00","desc":"","mac_filter_enabled":true},{"mac":"02:00:00:00:02:00","desc":"","mac_filter_enabled":true}]'
+need "the laptop is allowed too" set_filter allow "$both"
+check "the phone has kept its link" has_kept_link "$PHONE"
+check "the laptop comes in" rejoins "$LAPTOP" wlan0
+need "and is not any more" set_filter allow "$filter"
+check "it loses its link" eventually 5 not is_linked "$LAPTOP"
+check "the phone has kept its link" has_kept_link "$PHONE"
+
+need "no list is complete" hostapd_cli -p /run/hostapd -i wlan0 set macaddr_acl 2
+check "who is in none does not come in" is_rejected "$LAPTOP"
+check "who is in has kept its link" has_kept_link "$PHONE"
+
 off='[{"mac":"02:00:00:00:01:00","desc":"phone","mac_filter_enabled":false}]'
 need "an entry that is off permits nobody" set_filter allow "$off"
 check "the phone loses its link" eventually 5 not is_linked "$PHONE"

@@ -100,6 +100,9 @@ void FakeHostapd::Serve() {
 
 Answerer WithStations(std::vector<std::string> records) {
   return [records = std::move(records)](const std::string &request) -> std::optional<std::string> {
+    if (request == "PING") {
+      return "PONG\n";
+    }
     if (request == "STATUS") {
       return "state=ENABLED\nphy=phy0\nchannel=1\nbss[0]=none0\nnum_sta[0]=" + std::to_string(records.size()) + "\n";
     }
@@ -134,7 +137,7 @@ std::string StationText(const std::string &mac, bool authorized) {
 }
 
 RealHostapd::RealHostapd(const std::vector<std::string> &names) {
-  std::vector<std::string> words = {kProgram, "-t", "-f", "/tmp/hostapd.log"};
+  std::vector<std::string> words = {kProgram, "-t", "-d", "-f", kHostapdLog};
   for (const std::string &name : names) {
     words.push_back("/etc/hostapd/" + name + ".conf");
   }
@@ -151,7 +154,7 @@ RealHostapd::RealHostapd(const std::vector<std::string> &names) {
   }
   for (const std::string &name : names) {
     if (!Eventually(5000, [&name] { return Ask(name, "PING") == "PONG\n"; })) {
-      throw std::runtime_error("hostapd does not come up: " + ReadText("/tmp/hostapd.log"));
+      throw std::runtime_error("hostapd does not come up: " + ReadText(kHostapdLog));
     }
   }
 }

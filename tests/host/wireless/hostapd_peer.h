@@ -18,6 +18,9 @@ namespace hosttest {
 
 constexpr char kControlFolder[] = "/run/hostapd";
 
+/// What a RealHostapd was asked, and more.
+constexpr char kHostapdLog[] = "/tmp/hostapd.log";
+
 /// Writes /etc/hostapd/<name>.conf: one network of its own, with a control socket and no radio.
 void WriteHostapdConfig(const std::string &name, const std::string &more = "");
 

@@ -1,7 +1,7 @@
 // What a MAC filter may say, and the texts that are made of it.
 #include "host/wireless/adapter_config.h"
-#include "host/wireless/adapter_writer.h"
 #include "host/wireless/mac_filter.h"
+#include "host/wireless/network_acl.h"
 
 #include <gmock/gmock.h>
 #include <json/reader.h>
@@ -141,6 +141,20 @@ TEST(AdapterText, WhatCouldNotBeReadBackIsRefused) {
   }
   config["desc"] = deep;
   EXPECT_THROW(vornhost::RenderAdapterConfig(config), std::runtime_error);
+}
+
+TEST(NetworkAcl, IsWhatTheNetworksOwnPartOfTheFileSays) {
+  const std::string content = "macaddr_acl=2\n# macaddr_acl=2\ninterface=wlan0\nmacaddr_acl=1\naccept_mac_file=/a\n"
+                              "#deny_mac_file=/x\naccept_mac_file=/b\nbss=gwlan0\ndeny_mac_file=/c=d\nbss=other\n";
+  const auto home = vornhost::ParseNetworkAcl(content, "wlan0");
+  EXPECT_EQ(home.macaddrAcl, "1");
+  EXPECT_THAT(home.acceptFiles, ElementsAre("/a", "/b"));
+  EXPECT_THAT(home.denyFiles, IsEmpty());
+  const auto guests = vornhost::ParseNetworkAcl(content, "gwlan0");
+  EXPECT_EQ(guests.macaddrAcl, "0");
+  EXPECT_THAT(guests.acceptFiles, IsEmpty());
+  EXPECT_THAT(guests.denyFiles, ElementsAre("/c=d"));
+  EXPECT_EQ(vornhost::ParseNetworkAcl(content, "other").macaddrAcl, "0");
 }
 
 } // namespace
