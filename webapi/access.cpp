@@ -20,13 +20,26 @@ struct OwnPath {
 };
 
 // None has the form of a row's path, which has three parts behind "/webapi/".
-constexpr std::array<OwnPath, 7> kOwnPaths = {{{"/webapi/login", OwnCall::kLogin},
+constexpr std::array<OwnPath, 9> kOwnPaths = {{{"/webapi/login", OwnCall::kLogin},
                                                {"/webapi/logout", OwnCall::kLogout},
                                                {"/webapi/session", OwnCall::kSession},
                                                {"/webapi/password", OwnCall::kPassword},
                                                {"/webapi/tokens/list", OwnCall::kTokenList},
                                                {"/webapi/tokens/make", OwnCall::kTokenMake},
-                                               {"/webapi/tokens/revoke", OwnCall::kTokenRevoke}}};
+                                               {"/webapi/tokens/revoke", OwnCall::kTokenRevoke},
+                                               {"/openapi.json", OwnCall::kDocument},
+                                               {"/metrics", OwnCall::kMetrics}}};
+
+constexpr bool InOrder() {
+  size_t place = 0;
+  for (const OwnPath &each : kOwnPaths) {
+    if (static_cast<size_t>(each.call) != ++place) {
+      return false;
+    }
+  }
+  return true;
+}
+static_assert(InOrder(), "OwnPaths promises it");
 
 OwnCall FindOwn(std::string_view target) {
   const auto *found =
@@ -65,6 +78,14 @@ std::optional<std::string> BearerToken(const RequestHead &head) {
 }
 
 } // namespace
+
+std::vector<std::string> OwnPaths() {
+  std::vector<std::string> paths;
+  for (const OwnPath &each : kOwnPaths) {
+    paths.emplace_back(each.path);
+  }
+  return paths;
+}
 
 bool Reads(std::string_view target) {
   constexpr std::array<std::string_view, 4> kReading = {"get", "getcount", "test", "tablesget"};
@@ -158,9 +179,9 @@ Decision Access::Decide(const RequestHead &head, const Peer &peer) {
     if (account_.MustChange() && !permitted) {
       decision.refused = Forbidden("the first password must be changed");
     }
-  } else if (decision.own != OwnCall::kNone) {
+  } else if (decision.own != OwnCall::kNone && !IsReport(decision.own)) {
     decision.refused = Forbidden("this is for the administrator in person");
-  } else if (!caller.writes_ && !Reads(head.target)) {
+  } else if (decision.own == OwnCall::kNone && !caller.writes_ && !Reads(head.target)) {
     decision.refused = Forbidden("this token may only read");
   }
   return decision;

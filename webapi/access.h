@@ -42,7 +42,26 @@ private:
 };
 
 /// The server's own calls, beside the module's rows.
-enum class OwnCall { kNone, kLogin, kLogout, kSession, kPassword, kTokenList, kTokenMake, kTokenRevoke };
+enum class OwnCall {
+  kNone,
+  kLogin,
+  kLogout,
+  kSession,
+  kPassword,
+  kTokenList,
+  kTokenMake,
+  kTokenRevoke,
+  kDocument, ///< these two are read with GET, with a token too
+  kMetrics
+};
+
+/// Tells of the server and changes nothing.
+inline bool IsReport(OwnCall call) {
+  return call == OwnCall::kDocument || call == OwnCall::kMetrics;
+}
+
+/// The paths of the own calls, each at the place that its OwnCall has behind kNone.
+std::vector<std::string> OwnPaths();
 
 /// Whether it goes on with a request.
 struct Decision {

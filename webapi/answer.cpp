@@ -55,6 +55,11 @@ Answer Answered(std::string body) {
   return answer;
 }
 
+bool IsRowsError(const Answer &answer) {
+  constexpr std::string_view kFailed = R"({"success":false)";
+  return answer.status == 200 && answer.body.compare(0, kFailed.size(), kFailed) == 0;
+}
+
 Answer BadRequest(const char *reason) {
   return RefusedAndClosed(400, reason);
 }
@@ -84,9 +89,9 @@ Answer NoPage() {
 Answer NoSuchFile() {
   return Refused(404, "no such file");
 }
-Answer MethodNotAllowed() {
-  Answer answer = Refused(405, "a row is called with POST");
-  answer.allow = "POST";
+Answer MethodNotAllowed(const char *allow) {
+  Answer answer = Refused(405, "only the methods in Allow");
+  answer.allow = allow;
   return answer;
 }
 Answer RequestTimeout() {
@@ -146,7 +151,7 @@ std::string Render(const Answer &answer, bool keepAlive, bool headOnly) {
   out += DateText();
   out += "\r\n";
   if (answer.fileFields.empty()) {
-    out += "Content-Type: application/json\r\n";
+    out.append("Content-Type: ").append(answer.type).append("\r\n");
     out += kBrowserFields;
   } else {
     out += answer.fileFields;

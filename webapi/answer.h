@@ -11,6 +11,7 @@ struct Answer {
   unsigned status = 200;
   std::string body;
   bool close = false; ///< the connection cannot be used after it
+  const char *type = "application/json";
   const char *allow = nullptr;
   std::string cookie;      ///< the value of Set-Cookie; empty: none
   unsigned retryAfter = 0; ///< seconds; 0: not said
@@ -21,9 +22,11 @@ struct Answer {
 
 /// A handler's own answer.
 Answer Answered(std::string body);
+/// The row answered, and with an error: the status does not tell.
+bool IsRowsError(const Answer &answer);
 
-// Each has the body {"success":false,"error":{"code":<status>,"message":"..."}}, at most 200 bytes. `reason` is a
-// static text without characters that JSON escapes; no input is ever repeated in it.
+// Each that follows has the body {"success":false,"error":{"code":<status>,"message":"..."}}, at most 200 bytes.
+// `reason` is a static text without characters that JSON escapes; no input is ever repeated in it.
 Answer BadRequest(const char *reason); ///< malformed HTTP: closes
 Answer BadBody(const char *reason);
 Answer NotLoggedIn();
@@ -33,7 +36,7 @@ Answer TooManyTries(unsigned retryAfter);
 Answer NotFound();
 Answer NoPage();     ///< none is installed
 Answer NoSuchFile(); ///< of the page
-Answer MethodNotAllowed();
+Answer MethodNotAllowed(const char *allow = "POST");
 Answer RequestTimeout();
 Answer BodyTooLarge();
 Answer TargetTooLong();

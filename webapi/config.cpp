@@ -28,9 +28,10 @@ struct Key {
 
 constexpr size_t kDay = 86'400'000;
 
-constexpr std::array<Key, 36> kKeys = {{
+constexpr std::array<Key, 37> kKeys = {{
     {"listen", &Config::listen, 0, 0, "address and port; port 0: any free one; [::1]:8080 for IPv6"},
     {"module", &Config::module, 0, 0, "the shared library to serve"},
+    {"description", &Config::description, 0, 0, "what /openapi.json says of the module's rows, a JSON file"},
     {"host-names", &Config::hostNames, 0, 0, "names, beside localhost, that a request may have in Host"},
     {"state", &Config::state, 0, 0, "folder of the password, the tokens and the certificate"},
     {"page", &Config::page, 0, 0, "folder of the web page, read whole at the start; one that is not there: no page"},

@@ -14,6 +14,7 @@ using Milliseconds = std::chrono::milliseconds;
 struct Config {
   std::string listen = "127.0.0.1:8080";
   std::string module;
+  std::string description;
   std::string hostNames; ///< blank-separated
   std::string state = "/var/lib/vorn";
   std::string page = "/usr/share/vorn/page";

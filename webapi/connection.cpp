@@ -28,6 +28,7 @@ Connection::Connection(Shared &shared, Socket socket, const ClientKey &client, H
     : shared_(shared), transport_(std::move(socket), shared.tls), client_(client),
       session_(shared.service, std::move(hosts), std::move(peer)) {
   Enter(Phase::kIdle, shared_.tls != nullptr ? shared_.config.handshakeTime : shared_.config.idleTime);
+  shared_.service.Counts().AddConnection();
   shared_.connections.Add(*this); // from here on it may be swept
 }
 
@@ -36,6 +37,7 @@ Connection::~Connection() {
     RunCallbacks(); // the client went before its answer
   }
   transport_.Close();
+  shared_.service.Counts().RemoveConnection();
   shared_.connections.Remove(*this, client_);
 }
 

@@ -235,6 +235,7 @@ void Listener::Welcome(int descriptor) {
   if (admission != Connections::Admission::kAdmitted) {
     Log(LogKind::kConnectionLimit, "%s: %s", AddressText(client.address()).c_str(),
         admission == Connections::Admission::kTooMany ? "too many connections" : "too many connections of this client");
+    shared_.service.Counts().CountRefused(TooManyConnections().status);
     TurnAway(socket.release(), shared_.tls != nullptr, TooManyConnections());
     return;
   }

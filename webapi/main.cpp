@@ -1,3 +1,4 @@
+#include "webapi/api_document.h"
 #include "webapi/config.h"
 #include "webapi/log.h"
 #include "webapi/module.h"
@@ -80,6 +81,20 @@ bool OpenState(const vornwebapi::Config &config, vornwebapi::Access &access, vor
   return !config.tls || tls != nullptr;
 }
 
+/// A row that is not described is served all the same: the module is needed more than its description.
+std::string MakeDocument(const vornwebapi::Config &config, const std::vector<VORN::APIEntry> &rows) {
+  std::string description;
+  std::vector<std::string> faults;
+  const bool read = config.description.empty() || vornwebapi::ReadDescription(config.description, description);
+  std::string document = vornwebapi::MakeApiDocument(rows, description, config.tls, faults);
+  if (!config.description.empty() && (!read || !faults.empty())) {
+    vornwebapi::Log(vornwebapi::LogKind::kLifecycle, "%s: %s",
+                    vornwebapi::Printable(config.description, PATH_MAX).c_str(),
+                    read ? vornwebapi::Printable(faults.front()).c_str() : "cannot be read");
+  }
+  return document;
+}
+
 /// For root, who can read all of the state anyway: programs of this machine get in without a person.
 int MakeToken(const vornwebapi::Config &config) {
   constexpr std::int64_t kTenYears = 3650L * 86'400; // seconds
@@ -125,6 +140,7 @@ int main(int argc, char **argv) {
   }
   vornwebapi::Service service(config, rows);
   service.Page().Load(config.page);
+  service.SetDocument(MakeDocument(config, rows));
   vornwebapi::TlsContext tls;
   if (!OpenState(config, service.Gate(), tls, fault)) {
     return Refuse(fault);

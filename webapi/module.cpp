@@ -56,6 +56,10 @@ const char *FaultOf(const VORN::APIEntry &row) {
 
 } // namespace
 
+std::string PathOf(const VORN::APIEntry &row) {
+  return std::string("/webapi/") + row.api + '/' + std::to_string(row.version) + '/' + row.method;
+}
+
 bool CheckTable(const VORN::APIEntry *table, std::vector<VORN::APIEntry> &rows, std::string &fault) {
   if (table == nullptr) {
     fault = "GetAPITable returned no table";

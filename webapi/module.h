@@ -17,6 +17,9 @@ namespace vornwebapi {
 /// @return false when the module is not to be served
 bool LoadModule(const std::string &path, std::vector<VORN::APIEntry> &rows, std::string &fault);
 
+/// Where a row is reached.
+std::string PathOf(const VORN::APIEntry &row);
+
 /// The check alone. A table without an end row within 4096 rows is refused.
 bool CheckTable(const VORN::APIEntry *table, std::vector<VORN::APIEntry> &rows, std::string &fault);
 

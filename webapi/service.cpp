@@ -3,10 +3,12 @@
 #include "webapi/config.h"
 #include "webapi/handler_response.h"
 #include "webapi/log.h"
+#include "webapi/module.h"
 #include "webapi/own_calls.h"
 #include "webapi/parameters.h"
 #include "webapi/text.h"
 
+#include <algorithm>
 #include <exception>
 #include <iterator>
 #include <sstream>
@@ -51,18 +53,50 @@ std::vector<std::string> ReadHostNames(const std::string &text) {
   return {std::istream_iterator<std::string>(words), std::istream_iterator<std::string>()};
 }
 
+std::string NameOf(const VORN::APIEntry &row) {
+  return std::string(row.api) + " v" + std::to_string(row.version) + " " + row.method;
+}
+
+/// Own calls by their paths, then rows by their names.
+std::vector<std::string> LabelsOf(const std::vector<VORN::APIEntry> &rows) {
+  std::vector<std::string> labels = OwnPaths();
+  std::transform(rows.begin(), rows.end(), std::back_inserter(labels), NameOf);
+  return labels;
+}
+
 } // namespace
 
 Service::Service(const Config &config, const std::vector<VORN::APIEntry> &rows)
     : access_(config), loginBodyBytes_(config.loginBodyBytes), http_{config.requestLineBytes, config.headerBytes,
                                                                      config.headerFields, config.bodyBytes},
       hostNames_(ReadHostNames(config.hostNames)), json_{config.jsonDepth, config.jsonValues},
-      tasks_({config.tasks, config.taskKeepTime}) {
+      tasks_({config.tasks, config.taskKeepTime}), metrics_(LabelsOf(rows)) {
+  size_t label = Metrics::kFirstName + OwnPaths().size();
   for (const VORN::APIEntry &row : rows) {
-    const std::string version = std::to_string(row.version);
-    const std::string path = std::string("/webapi/") + row.api + '/' + version + '/' + row.method;
-    routes_.emplace(path, Route{row, std::string(row.api) + " v" + version + " " + row.method});
+    routes_.emplace(PathOf(row), Route{row, NameOf(row), label++});
   }
+}
+
+size_t Service::LabelOf(const Decision &decision, std::string_view path) const {
+  if (decision.page) {
+    return Metrics::kPage;
+  }
+  if (decision.own != OwnCall::kNone) {
+    return Metrics::kFirstName + static_cast<size_t>(decision.own) - 1;
+  }
+  const Route *route = Find(path);
+  return route == nullptr ? Metrics::kUnknown : route->label;
+}
+
+Answer Service::Report(OwnCall call) {
+  Answer answer;
+  if (call == OwnCall::kDocument) {
+    answer.file = document_;
+    return answer;
+  }
+  answer.type = "text/plain; version=0.0.4; charset=utf-8";
+  answer.body = metrics_.Text({metrics_.Connections(), access_.Sessions().Count(), tasks_.Count()});
+  return answer;
 }
 
 const Route *Service::Find(std::string_view path) const {

@@ -6,6 +6,7 @@
 #include "webapi/answer.h"
 #include "webapi/callbacks.h"
 #include "webapi/json_scanner.h"
+#include "webapi/metrics.h"
 #include "webapi/request_reader.h"
 #include "webapi/request_state.h"
 #include "webapi/static_files.h"
@@ -24,6 +25,7 @@ struct Config;
 struct Route {
   VORN::APIEntry row;
   std::string name;
+  size_t label = 0; ///< in the metrics
 };
 
 /// What came of a call.
@@ -43,11 +45,20 @@ public:
   TaskRegistry &Tasks() { return tasks_; }
   Access &Gate() { return access_; }
   StaticFiles &Page() { return page_; }
+  Metrics &Counts() { return metrics_; }
+  void SetDocument(std::string document) { document_ = std::move(document); } ///< before anything is served
   size_t LoginBodyBytes() const { return loginBodyBytes_; }
 
   /// @param[in] path  the request's target, compared byte by byte
   /// @return null when there is no such row
   const Route *Find(std::string_view path) const;
+
+  /// What a request is counted as.
+  /// @param[in] decision  that on it; none was made yet for one that is malformed
+  size_t LabelOf(const Decision &decision, std::string_view path) const;
+
+  /// Answers a call that tells of the server.
+  Answer Report(OwnCall call);
 
   /// Runs a row's handler. No exception leaves it.
   Outcome Call(const Route &route, const Caller &caller, const Peer &peer, const RequestHead &head,
@@ -68,6 +79,8 @@ private:
   JsonLimits json_;
   TaskRegistry tasks_;
   StaticFiles page_;
+  Metrics metrics_;
+  std::string document_; // OpenAPI
   std::unordered_map<std::string, Route, Hash, std::equal_to<>> routes_;
 };
 

@@ -30,6 +30,7 @@ Session::Wants Session::Step() {
 // What the header alone decides is answered before the body is taken.
 Session::Wants Session::Head() {
   const RequestHead &head = reader_.Head();
+  begun_ = std::chrono::steady_clock::now();
   decision_ = service_.Gate().Decide(head, peer_);
   if (decision_.refused) {
     return Refuse(*decision_.refused);
@@ -41,6 +42,10 @@ Session::Wants Session::Head() {
   route_ = own ? nullptr : service_.Find(head.target);
   if (!own && route_ == nullptr) {
     return Refuse(NotFound());
+  }
+  if (IsReport(decision_.own)) {
+    const bool reads = head.method == "GET" || head.method == "HEAD";
+    return Refuse(reads ? service_.Report(decision_.own) : MethodNotAllowed("GET, HEAD"));
   }
   if (head.method != "POST") {
     return Refuse(MethodNotAllowed());
@@ -70,6 +75,10 @@ std::string Session::Finish(const Answer &answer, bool stopping, bool &close) {
   // A request whose body was not read leaves the connection where no one can tell body from request.
   const bool whole = state_ == RequestReader::State::kDone || (state_ == RequestReader::State::kHead && !head.hasBody);
   close = answer.close || stopping || !whole || !head.keepAlive;
+  const bool headed = state_ != RequestReader::State::kFailed && begun_ != std::chrono::steady_clock::time_point();
+  service_.Counts().Count(headed ? service_.LabelOf(decision_, head.target) : Metrics::kUnknown, answer.status,
+                          IsRowsError(answer), std::chrono::steady_clock::now() - begun_);
+  begun_ = {};
   std::string text = Render(answer, !close, HeadOnly());
   if (!close) {
     reader_.Next();

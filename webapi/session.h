@@ -5,6 +5,7 @@
 #include "webapi/request_reader.h"
 #include "webapi/service.h"
 
+#include <chrono>
 #include <string>
 #include <string_view>
 
@@ -48,8 +49,9 @@ private:
   const Peer peer_;
   RequestReader reader_;
   RequestReader::State state_ = RequestReader::State::kIdle;
-  Decision decision_;            // on the request at hand
-  const Route *route_ = nullptr; // null: one of the server's own calls
+  Decision decision_;                                // on the request at hand
+  std::chrono::steady_clock::time_point begun_ = {}; // its header was whole
+  const Route *route_ = nullptr;                     // null: one of the server's own calls
   Answer refusal_;
 };
 

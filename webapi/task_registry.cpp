@@ -57,6 +57,7 @@ struct TaskRegistry::Inner {
   bool stopping = false;
 
   int Admit(const Kind &kind);
+  size_t Count() const;
   bool MakeRoom();
   void PurgeLocked(Clock::time_point now);
   TaskPointer Find(const std::string &user, const std::string &id);
@@ -64,10 +65,16 @@ struct TaskRegistry::Inner {
 };
 
 // REQUIRES: mutex is held.
+size_t TaskRegistry::Inner::Count() const {
+  const auto kept =
+      std::count_if(tasks.begin(), tasks.end(), [](const TaskPointer &task) { return task->response.Finished(); });
+  return running + static_cast<size_t>(kept);
+}
+
+// REQUIRES: mutex is held.
 bool TaskRegistry::Inner::MakeRoom() {
   const auto finished = [](const TaskPointer &task) { return task->response.Finished(); };
-  const auto kept = static_cast<size_t>(std::count_if(tasks.begin(), tasks.end(), finished));
-  if (running + kept < limits.tasks) {
+  if (Count() < limits.tasks) {
     return true;
   }
   auto oldest = tasks.end();
@@ -208,6 +215,11 @@ int TaskRegistry::Stop(const std::string &user, const std::string &id, bool forc
   }
   inner_->tasks.remove(task);
   return 0;
+}
+
+size_t TaskRegistry::Count() {
+  const std::lock_guard lock(inner_->mutex);
+  return inner_->Count();
 }
 
 void TaskRegistry::Purge() {

@@ -62,6 +62,9 @@ public:
   int Status(const std::string &user, const std::string &id, Json::Value &data);
   int Stop(const std::string &user, const std::string &id, bool force);
 
+  /// Those that run, stopped ones too, and those that are kept.
+  size_t Count();
+
   /// Drops finished tasks whose time is over.
   void Purge();
 

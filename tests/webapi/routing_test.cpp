@@ -51,8 +51,7 @@ TEST_F(RoutingTest, OnlyTheExactPathOfARowFindsIt) {
                              "/webapi/VORN.Test.Echo/1/get#a",
                              "/webapi\\VORN.Test.Echo\\1\\get",
                              "/../../etc/shadow",
-                             "/%2e%2e%2fetc/shadow",
-                             "/openapi.json"}) {
+                             "/%2e%2e%2fetc/shadow"}) {
     ExpectRefusal(Request("POST", target), 404);
   }
 }
