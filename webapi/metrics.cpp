@@ -24,7 +24,7 @@ std::string Number(double value) {
 
 } // namespace
 
-// Seconds: a read from memory, one from the kernel, a password's digest, a switch of the topology.
+// Seconds: a read from memory, one from the kernel, a password's digest, programs that a call waits for.
 const std::array<double, Metrics::kBuckets> Metrics::kBounds = {0.0005, 0.001, 0.005, 0.01, 0.05, 0.1, 0.5, 1, 5, 15};
 
 const std::array<unsigned, Metrics::kStatuses> Metrics::kRefusals = {400, 401, 403, 404, 405, 408, 413, 414, 415,

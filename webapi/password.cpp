@@ -11,7 +11,7 @@
 namespace vornwebapi {
 namespace {
 
-// RFC 9106, section 4, asks for 64 MiB and three passes where memory is scarce; a router has less to spare.
+// RFC 9106, section 4, asks for 64 MiB and three passes where memory is scarce; a small machine has less to spare.
 constexpr unsigned long long kPasses = 3;
 constexpr size_t kMemory = 32UL * 1024 * 1024; // bytes
 
