@@ -40,7 +40,7 @@ as_stored() { at router /etc/rc.network status >/dev/null; }
 readonly LAPTOP=192.168.1.110 PRINTER=192.168.1.111 CAMERA=192.168.1.112
 need "the laptop's servers run" serve_traffic laptop answer laptop tcp:7000 tcp:7001 tcp:7002 udp:7000 udp:7001 udp:7002
 need "the printer's servers run" serve_traffic printer answer printer tcp:9100 udp:9100 tcp:5353
-need "the camera's servers run" serve_traffic camera answer camera tcp:7000 udp:4000 tcp:8080
+need "the camera's servers run" serve_traffic camera answer camera tcp:7000 udp:4000 tcp:8443
 need "the laptop's streams run" serve_traffic laptop stream 1 tcp:6000 udp:6000
 need "the printer's streams run" serve_traffic printer stream 1000000 udp:6000
 
@@ -84,7 +84,7 @@ check "the rest goes to the DMZ host" answer_is "camera tcp 7000" isp tcp 7000
 check "UDP too" answer_is "camera udp 4000" isp udp 4000
 check "the DMZ host's page" same "page of camera" "$(page isp "http://$wan/")"
 check "a forward goes before the DMZ" same "page of laptop" "$(page isp "http://$wan:8081/")"
-check "the management port does not go to the DMZ host" no_answer isp tcp 8080
+check "the management port does not go to the DMZ host" no_answer isp tcp 8443
 check "the DMZ host is reached from inside by the outside address" same "page of camera" "$(page printer "http://$wan/")"
 check "the router renews its address" at router sh -c 'kill -USR1 "$(pidof udhcpc)"; sleep 1; ip -4 -o addr show eth0 | grep -q 203.0.113'
 need "the DMZ is switched off" set_dmz '{"enable": false}'
@@ -149,14 +149,14 @@ check "to the end" test "$(last_ms back)" -gt 1500
 
 need "a list with bad rules is stored" rules_are_set "$web" "$(rule 0 tcp $LAPTOP 80 true Zero)" \
   "$(rule 65536 tcp $LAPTOP 80 true High)" "$(rule 100-50 tcp $LAPTOP 80 true Backwards)" \
-  "$(rule 90 tcp 203.0.113.1 80 true Outside)" "$(rule 8080 tcp $LAPTOP 80 true Own)" \
+  "$(rule 90 tcp 203.0.113.1 80 true Outside)" "$(rule 8443 tcp $LAPTOP 80 true Own)" \
   "$(rule 8000-8090 tcp $LAPTOP 80 true Overlap)" "$(rule 91 'tcp; drop' $LAPTOP 80 true Shell)" "$raw"
 check "the good ones work" same "page of laptop" "$(page isp "http://$wan:8081/")"
 check "the last one too" answer_is "printer tcp 9100" isp tcp 9100
 for line in 'rule 1 "Zero" left out: sourcePort "0": no port' 'rule 2 "High" left out: sourcePort "65536": no port' \
   'rule 3 "Backwards" left out: sourcePort "100-50": no port' \
   'rule 4 "Outside" left out: targetIP "203.0.113.1": in no LAN of this router' \
-  "rule 5 \"Own\" left out: sourcePort \"8080\": has the router's management port 8080" \
+  "rule 5 \"Own\" left out: sourcePort \"8443\": has the router's management port 8443" \
   'rule 7 "Shell" left out: protocol "tcp; drop": not tcp, udp or both'; do
   check "the log says: $line" test "$(log_lines "$line")" -ge 1
   check "rc.network status says so too" status_says "${line/ left out/: left out}"
