@@ -1,5 +1,6 @@
 #include "webapi/static_files.h"
 
+#include "host/utility/unique_fd.h"
 #include "webapi/log.h"
 #include "webapi/password.h"
 #include "webapi/text.h"
@@ -82,22 +83,30 @@ bool HasDigestInName(std::string_view target) {
          std::any_of(digest.begin(), digest.end(), [](char c) { return c < 'a' || c > 'z'; });
 }
 
+/// @return how many bytes were read, fewer than asked for at the end of the file or after a fault
+size_t ReadBytes(int file, char *buffer, size_t size) {
+  size_t at = 0;
+  while (at < size) {
+    const ssize_t got = read(file, buffer + at, size - at);
+    if (got <= 0) {
+      break;
+    }
+    at += static_cast<size_t>(got);
+  }
+  return at;
+}
+
 /// @return what a regular file has, links not followed; none when it cannot be read or is too large
 std::optional<std::string> ReadFile(const std::string &path) {
-  const int file = open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+  const vornhost::UniqueFd file(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   struct stat info {};
-  std::optional<std::string> content;
-  if (file >= 0 && fstat(file, &info) == 0 && S_ISREG(info.st_mode) &&
-      static_cast<size_t>(info.st_size) <= kLargestFile) {
-    content.emplace(static_cast<size_t>(info.st_size), '\0');
-    size_t at = 0;
-    for (ssize_t got = 1; got > 0 && at < content->size(); at += static_cast<size_t>(std::max<ssize_t>(got, 0))) {
-      got = read(file, content->data() + at, content->size() - at);
-    }
-    content = at == content->size() ? std::move(content) : std::nullopt;
+  if (!file.IsOpen() || fstat(file.Get(), &info) != 0 || !S_ISREG(info.st_mode) ||
+      static_cast<size_t>(info.st_size) > kLargestFile) {
+    return std::nullopt;
   }
-  if (file >= 0) {
-    close(file);
+  std::string content(static_cast<size_t>(info.st_size), '\0');
+  if (ReadBytes(file.Get(), content.data(), content.size()) != content.size()) {
+    return std::nullopt;
   }
   return content;
 }
