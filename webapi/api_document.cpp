@@ -212,11 +212,47 @@ std::string FaultOf(const Json::Value &described) {
   return {};
 }
 
+/// @param[in] described  by "API/version/method"
+void AddRows(const std::vector<VORN::APIEntry> &rows, const Json::Value &described, Json::Value &paths,
+             std::vector<std::string> &faults) {
+  const auto add = [&faults](std::string name, const std::string &fault) {
+    faults.push_back(std::move(name.append(" ").append(fault)));
+  };
+  std::set<std::string> known;
+  for (const VORN::APIEntry &row : rows) {
+    const std::string path = PathOf(row);
+    const std::string name = path.substr(std::string_view("/webapi/").size());
+    const Json::Value &each = described[name];
+    const std::string fault = FaultOf(each);
+    if (!fault.empty()) {
+      add(name, fault);
+    }
+    known.insert(name);
+    paths[path]["post"] = OperationOf(row, fault.empty() ? each : Json::Value(Json::objectValue));
+  }
+  for (const std::string &name : described.getMemberNames()) {
+    if (known.count(name) == 0) {
+      add(name, "is described and is no row");
+    }
+  }
+}
+
+/// A description's members of another type than theirs are taken for missing.
+Json::Value ReadDescribed(const std::string &text) {
+  Json::Value described = Read(text);
+  for (const char *member : {"rows", "schemas"}) {
+    if (!described[member].isObject()) {
+      described[member] = Json::Value(Json::objectValue);
+    }
+  }
+  return described;
+}
+
 } // namespace
 
 std::string MakeApiDocument(const std::vector<VORN::APIEntry> &rows, const std::string &description, bool secure,
                             std::vector<std::string> &faults) {
-  const Json::Value described = Read(description);
+  const Json::Value described = ReadDescribed(description);
   const Json::Value own = Read(kOwnCallsText);
   Json::Value document;
   document["openapi"] = "3.1.0";
@@ -225,23 +261,7 @@ std::string MakeApiDocument(const std::vector<VORN::APIEntry> &rows, const std::
   document["security"] = SecurityOf("any");
   document["components"] = Components(described, secure);
   Json::Value &paths = document["paths"];
-  std::set<std::string> known;
-  for (const VORN::APIEntry &row : rows) {
-    const std::string path = PathOf(row);
-    const std::string name = path.substr(std::string_view("/webapi/").size());
-    const Json::Value &each = described["rows"][name];
-    const std::string fault = FaultOf(each);
-    if (!fault.empty()) {
-      faults.push_back(name + ' ' + fault);
-    }
-    known.insert(name);
-    paths[path]["post"] = OperationOf(row, fault.empty() ? each : Json::Value(Json::objectValue));
-  }
-  for (const std::string &name : described["rows"].getMemberNames()) {
-    if (known.count(name) == 0) {
-      faults.push_back(name + " is described and is no row");
-    }
-  }
+  AddRows(rows, described["rows"], paths, faults);
   for (const std::string &path : own.getMemberNames()) {
     paths[path][own[path]["method"].asString()] = OperationOfServer(path, own[path]);
   }

@@ -205,7 +205,7 @@ TEST(DescriptionTest, WhatIsMissingOrTooMuchIsNamed) {
 }
 
 TEST(DescriptionTest, NoneAtAllLeavesTheRows) {
-  for (const char *text : {"", "{", "[]", "null"}) {
+  for (const char *text : {"", "{", "[]", "null", R"({"rows":[],"schemas":[]})", R"({"rows":1,"schemas":"x"})"}) {
     std::vector<std::string> faults;
     const Json::Value document = ParseJson(vornwebapi::MakeApiDocument(Rows(), text, false, faults));
     EXPECT_EQ(faults.size(), 23U);
