@@ -139,7 +139,7 @@ Answer UnknownVersion() {
   return RefusedAndClosed(505, "HTTP/1.1 is spoken here");
 }
 
-std::string Render(const Answer &answer, bool keepAlive, bool headOnly) {
+std::string Render(const Answer &answer, bool keepAlive, bool headOnly, bool secure) {
   const auto reason = boost::beast::http::obsolete_reason(static_cast<boost::beast::http::status>(answer.status));
   std::string out;
   out.reserve(704 + answer.body.size());
@@ -158,6 +158,10 @@ std::string Render(const Answer &answer, bool keepAlive, bool headOnly) {
   }
   if (answer.status != 304) { // it has no body, whatever it would say of one (RFC 9110, section 15.4.5)
     out.append("Content-Length: ").append(std::to_string(answer.body.size() + answer.file.size())).append("\r\n");
+  }
+  if (secure) { // of use once the owner trusts the certificate; until then browsers do not heed it (RFC 6797,
+                // section 8.1)
+    out += "Strict-Transport-Security: max-age=31536000\r\n";
   }
   if (!answer.cookie.empty()) {
     out.append("Set-Cookie: ").append(answer.cookie).append("\r\n");

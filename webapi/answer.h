@@ -55,7 +55,8 @@ Answer UnknownVersion();
 /// The bytes on the wire; of a file its header only.
 /// @param[in] keepAlive  the client may go on using the connection
 /// @param[in] headOnly   without the body, as HEAD asks for
-std::string Render(const Answer &answer, bool keepAlive, bool headOnly);
+/// @param[in] secure     over TLS
+std::string Render(const Answer &answer, bool keepAlive, bool headOnly, bool secure = false);
 
 } // namespace vornwebapi
 

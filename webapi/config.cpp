@@ -42,6 +42,7 @@ constexpr std::array<Key, 37> kKeys = {{
     {"queue", &Config::queue, 0, 10'000, "calls that may wait for a slot; further ones get 503"},
     {"connections", &Config::connections, 1, 100'000, "open connections in all"},
     {"connections-per-address", &Config::connectionsPerAddress, 1, 100'000, "open connections from one address"},
+    {"tls-connections", &Config::tlsConnections, 1, 100'000, "that speak TLS; then the one that waits longest is cut"},
     {"request-line-bytes", &Config::requestLineBytes, 64, 65'536, "longest request line, else 414"},
     {"header-bytes", &Config::headerBytes, 64, 65'536, "longest header after the request line, else 431"},
     {"header-fields", &Config::headerFields, 1, 1'000, "most header fields, else 431"},

@@ -26,6 +26,7 @@ struct Config {
   size_t queue = 64;
   size_t connections = 10240;
   size_t connectionsPerAddress = 64;
+  size_t tlsConnections = 512;
 
   size_t requestLineBytes = 8192;
   size_t headerBytes = 8192;

@@ -5,6 +5,7 @@
 #include <boost/asio/post.hpp>
 
 #include <array>
+#include <limits>
 #include <utility>
 
 namespace vornwebapi {
@@ -51,9 +52,16 @@ void Connection::Enter(Phase phase, Milliseconds time) {
 }
 
 void Connection::ExpireBefore(Connections::Clock::time_point time) {
-  if (phase_ == Phase::kCall || deadline_ > time.time_since_epoch().count()) {
-    return;
+  if (WaitsUntil() <= time.time_since_epoch().count()) {
+    Cut();
   }
+}
+
+Connections::Clock::rep Connection::WaitsUntil() const {
+  return phase_ == Phase::kCall ? std::numeric_limits<Connections::Clock::rep>::max() : deadline_.load();
+}
+
+void Connection::Cut() {
   expired_ = true;
   if (phase_ == Phase::kWrite) {
     transport_.Abort();
@@ -85,6 +93,9 @@ void Connection::OnReadable() {
   if (expired_ || shared_.stopping) {
     OnExpired();
     return;
+  }
+  if (transport_.StartTls()) {
+    shared_.connections.HoldTls(*this);
   }
   size_t count = 0;
   switch (transport_.Read(Scratch().data(), Scratch().size(), count)) {

@@ -41,6 +41,9 @@ public:
 
   // From any thread.
   void ExpireBefore(Connections::Clock::time_point time);
+  /// When its client is too slow; the end of time while it is not the client that is waited for.
+  Connections::Clock::rep WaitsUntil() const;
+  void Cut(); ///< as at its deadline
   void Stop();
   void Abort() { transport_.Abort(); }
 

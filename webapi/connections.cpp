@@ -1,6 +1,7 @@
 #include "webapi/connections.h"
 
 #include "webapi/connection.h"
+#include "webapi/log.h"
 
 #include <algorithm>
 
@@ -23,7 +24,8 @@ ClientKey KeyOf(const boost::asio::ip::address &address) {
   return key;
 }
 
-Connections::Connections(size_t most, size_t mostOfClient) : most_(most), mostOfClient_(mostOfClient) {}
+Connections::Connections(size_t most, size_t mostOfClient, size_t mostTls)
+    : most_(most), mostOfClient_(mostOfClient), mostTls_(mostTls) {}
 
 Connections::~Connections() = default;
 
@@ -49,6 +51,7 @@ void Connections::Add(Connection &connection) {
 void Connections::Remove(Connection &connection, const ClientKey &client) {
   const std::lock_guard lock(mutex_);
   list_.erase(list_.iterator_to(connection));
+  tls_.erase(std::remove(tls_.begin(), tls_.end(), &connection), tls_.end());
   ReleaseLocked(client);
 }
 
@@ -66,6 +69,19 @@ void Connections::ReleaseLocked(const ClientKey &client) {
   if (--count_ == 0) {
     none_.notify_all();
   }
+}
+
+void Connections::HoldTls(Connection &connection) {
+  const std::lock_guard lock(mutex_);
+  if (tls_.size() >= mostTls_) {
+    const auto longest = std::min_element(tls_.begin(), tls_.end(), [](const Connection *a, const Connection *b) {
+      return a->WaitsUntil() < b->WaitsUntil();
+    });
+    (*longest)->Cut();
+    tls_.erase(longest);
+    Log(LogKind::kConnectionLimit, "too many TLS connections: the one that waited longest was cut");
+  }
+  tls_.push_back(&connection);
 }
 
 void Connections::Sweep(Clock::time_point time) {

@@ -10,6 +10,7 @@
 #include <cstddef>
 #include <map>
 #include <mutex>
+#include <vector>
 
 namespace vornwebapi {
 
@@ -27,7 +28,8 @@ public:
   using Clock = std::chrono::steady_clock;
   enum class Admission { kAdmitted, kTooMany, kTooManyOfClient };
 
-  Connections(size_t most, size_t mostOfClient);
+  /// @param[in] mostTls  that hold TLS's keys and buffers, some 15 to 50 KB each
+  Connections(size_t most, size_t mostOfClient, size_t mostTls);
   Connections(const Connections &) = delete;
   Connections &operator=(const Connections &) = delete;
   ~Connections();
@@ -38,6 +40,10 @@ public:
   void Add(Connection &connection);
   /// Takes an admitted one out; it waits until no sweep looks at it.
   void Remove(Connection &connection, const ClientKey &client);
+
+  /// An added one begins with TLS. With as many as may, the one that has waited longest for its client is cut: a
+  /// client that speaks is through before its turn comes.
+  void HoldTls(Connection &connection);
 
   /// Interrupts each whose deadline is before `time`.
   void Sweep(Clock::time_point time);
@@ -51,11 +57,13 @@ private:
 
   const size_t most_;
   const size_t mostOfClient_;
+  const size_t mostTls_;
   std::mutex mutex_;
   std::condition_variable none_;
   size_t count_ = 0;
   std::map<ClientKey, size_t> counts_;
   boost::intrusive::list<Connection, boost::intrusive::base_hook<ListHook>> list_;
+  std::vector<Connection *> tls_; // of list_
 };
 
 } // namespace vornwebapi

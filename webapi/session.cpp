@@ -79,7 +79,7 @@ std::string Session::Finish(const Answer &answer, bool stopping, bool &close) {
   service_.Counts().Count(headed ? service_.LabelOf(decision_, head.target) : Metrics::kUnknown, answer.status,
                           IsRowsError(answer), std::chrono::steady_clock::now() - begun_);
   begun_ = {};
-  std::string text = Render(answer, !close, HeadOnly());
+  std::string text = Render(answer, !close, HeadOnly(), peer_.secure);
   if (!close) {
     reader_.Next();
     decision_ = {};

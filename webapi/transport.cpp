@@ -16,12 +16,20 @@ Transport::Result ResultOfErrno() {
 } // namespace
 
 Transport::Transport(Socket socket, SSL_CTX *tls)
-    : socket_(std::move(socket)), tls_(tls == nullptr ? nullptr : SSL_new(tls)) {
-  if (tls_) {
-    SSL_set_accept_state(tls_.get());
-    SSL_set_fd(tls_.get(), socket_.native_handle());
+    : socket_(std::move(socket)), context_(tls), broken_(tls != nullptr) {} // until TLS has begun nothing may be sent
+
+bool Transport::StartTls() {
+  if (context_ == nullptr || tls_) {
+    return false;
   }
-  broken_ = tls != nullptr && !tls_; // no memory
+  tls_.reset(SSL_new(context_));
+  if (!tls_) { // no memory
+    return false;
+  }
+  SSL_set_accept_state(tls_.get());
+  SSL_set_fd(tls_.get(), socket_.native_handle());
+  broken_ = false;
+  return true;
 }
 
 Transport::Result Transport::ResultOfTls(int returned, bool &wantsOther, int other) {

@@ -26,7 +26,8 @@ public:
   Transport(Socket socket, SSL_CTX *tls);
 
   template <typename Handler> void WaitReadable(Handler handler) {
-    if (tls_ && SSL_has_pending(tls_.get()) == 1) {
+    // What was decrypted and not read. Half a record is waited for as any bytes are: SSL_has_pending counts it too.
+    if (tls_ && SSL_pending(tls_.get()) > 0) {
       boost::asio::post(socket_.get_executor(), [handler = std::move(handler)]() mutable { handler({}); });
       return;
     }
@@ -37,6 +38,10 @@ public:
     socket_.async_wait(writeWantsRead_ ? boost::asio::socket_base::wait_read : boost::asio::socket_base::wait_write,
                        std::move(handler));
   }
+
+  /// Before the first Read: a client that says nothing costs nothing of TLS.
+  /// @return true when TLS begins now
+  bool StartTls();
 
   /// @param[out] count  bytes read, 1 or more with kDone
   Result Read(char *buffer, size_t size, size_t &count);
@@ -62,6 +67,7 @@ private:
   Result WriteTls(std::string_view &bytes);
 
   Socket socket_;
+  SSL_CTX *const context_; // null: no TLS
   std::unique_ptr<SSL, FreeSsl> tls_;
   bool readWantsWrite_ = false; // a read or write that the handshake turns round
   bool writeWantsRead_ = false;

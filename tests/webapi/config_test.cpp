@@ -24,6 +24,7 @@ TEST(Config, HasTheDocumentedDefaults) {
   EXPECT_EQ(config.slots, 16U);
   EXPECT_EQ(config.queue, 64U);
   EXPECT_EQ(config.connectionsPerAddress, 64U);
+  EXPECT_EQ(config.tlsConnections, 512U);
   EXPECT_EQ(config.requestLineBytes, 8192U);
   EXPECT_EQ(config.headerBytes, 8192U);
   EXPECT_EQ(config.headerFields, 100U);
