@@ -152,20 +152,6 @@ TEST_F(BodyTest, ADocumentThatEndsInACarriageReturnIsTaken) {
 }
 
 #if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__) // sanitizers hold memory of their own
-/// Kilobytes that the process holds for itself.
-size_t PrivateMemory(pid_t process) {
-  std::ifstream file("/proc/" + std::to_string(process) + "/smaps_rollup");
-  size_t sum = 0;
-  for (std::string word; file >> word;) {
-    if (word == "Private_Clean:" || word == "Private_Dirty:") {
-      size_t kilobytes = 0;
-      file >> kilobytes;
-      sum += kilobytes;
-    }
-  }
-  return sum;
-}
-
 class LargeBodyTest : public WebApiTest {
 protected:
   LargeBodyTest() : WebApiTest({"--json-values", "1000000"}) {}
@@ -173,8 +159,8 @@ protected:
 
 TEST_F(BodyTest, IdleMemoryIsUnderTenMegabytes) {
   ExpectServing();
-  EXPECT_LT(PrivateMemory(server_.Pid()), 10'240U);
-  EXPECT_GT(PrivateMemory(server_.Pid()), 100U);
+  EXPECT_LT(server_.PrivateMemory(), 10'240U);
+  EXPECT_GT(server_.PrivateMemory(), 100U);
 }
 
 /// Kilobytes of the most memory that the process ever had, pages of libraries among them.
@@ -187,17 +173,17 @@ size_t PeakMemory(pid_t process) {
   return peak;
 }
 
-void ExpectMemoryGivenBack(pid_t process, size_t before) {
+void ExpectMemoryGivenBack(const vorntest::ServerProcess &process, size_t before) {
   const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(5);
-  while (PrivateMemory(process) > before + 4'096 && std::chrono::steady_clock::now() < deadline) {
+  while (process.PrivateMemory() > before + 4'096 && std::chrono::steady_clock::now() < deadline) {
     std::this_thread::sleep_for(std::chrono::milliseconds(20));
   }
-  EXPECT_LT(PrivateMemory(process), before + 4'096);
+  EXPECT_LT(process.PrivateMemory(), before + 4'096);
 }
 
 TEST_F(BodyTest, TheMemoryOfTheWorstAcceptedDocumentIsBoundedAndGivenBack) {
   ExpectServing();
-  const size_t before = PrivateMemory(server_.Pid());
+  const size_t before = server_.PrivateMemory();
   const size_t peak = PeakMemory(server_.Pid());
   const std::string objects = "{\"a\":[" + Repeat("{\"12345678\":[]},", 24'990) + "{}]}";
   for (int round = 0; round < 3; ++round) {
@@ -205,16 +191,16 @@ TEST_F(BodyTest, TheMemoryOfTheWorstAcceptedDocumentIsBoundedAndGivenBack) {
   }
   EXPECT_GT(PeakMemory(server_.Pid()), peak);
   EXPECT_LT(PeakMemory(server_.Pid()), peak + 32'768);
-  ExpectMemoryGivenBack(server_.Pid(), before);
+  ExpectMemoryGivenBack(server_, before);
 }
 
 TEST_F(LargeBodyTest, AMegabyteOfZerosStaysWithin64MegabytesWhenItIsTaken) {
   ExpectServing();
-  const size_t before = PrivateMemory(server_.Pid());
+  const size_t before = server_.PrivateMemory();
   const size_t peak = PeakMemory(server_.Pid());
   ASSERT_EQ(Call("VORN.Test.Processor/1/get", "{\"a\":[" + Repeat("0,", 524'000) + "0]}").status, 200);
   EXPECT_LT(PeakMemory(server_.Pid()), peak + 65'536);
-  ExpectMemoryGivenBack(server_.Pid(), before);
+  ExpectMemoryGivenBack(server_, before);
 }
 #endif
 

@@ -16,11 +16,19 @@
 
 namespace vorntest {
 
-HttpClient::HttpClient(int port, int receiveBuffer) : descriptor_(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+HttpClient::HttpClient(int port, int receiveBuffer, uint32_t from)
+    : descriptor_(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
   if (receiveBuffer > 0) {
     setsockopt(descriptor_, SOL_SOCKET, SO_RCVBUF, &receiveBuffer, sizeof receiveBuffer);
   }
   sockaddr_in address{};
+  if (from != 0) {
+    address.sin_family = AF_INET;
+    address.sin_addr.s_addr = htonl(from);
+    if (bind(descriptor_, reinterpret_cast<const sockaddr *>(&address), sizeof address) != 0) {
+      Close();
+    }
+  }
   address.sin_family = AF_INET;
   address.sin_port = htons(static_cast<uint16_t>(port));
   address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);

@@ -3,6 +3,7 @@
 #define TESTS_WEBAPI_HTTP_CLIENT_H
 
 #include <chrono>
+#include <cstdint>
 #include <map>
 #include <string>
 #include <string_view>
@@ -18,12 +19,14 @@ struct HttpAnswer {
 class HttpClient {
 public:
   /// @param[in] receiveBuffer  in bytes; 0: the system's
-  explicit HttpClient(int port, int receiveBuffer = 0);
+  /// @param[in] from           this end's address in 127.0.0.0/8, as a number; 0: the system's choice
+  explicit HttpClient(int port, int receiveBuffer = 0, uint32_t from = 0);
   HttpClient(const HttpClient &) = delete;
   HttpClient &operator=(const HttpClient &) = delete;
   ~HttpClient() { Close(); }
 
   bool Connected() const { return descriptor_ >= 0; }
+  int Descriptor() const { return descriptor_; }
   void Close();
   void Reset();        ///< closes with a reset
   void CloseWriting(); ///< half-closes

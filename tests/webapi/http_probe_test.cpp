@@ -41,6 +41,14 @@ std::string Fields(int count) {
   return fields;
 }
 
+std::string Cookies(int count) {
+  std::string fields;
+  for (int index = 0; index < count; ++index) {
+    fields += "Cookie: a=" + std::to_string(index) + "\r\n";
+  }
+  return fields;
+}
+
 /// These are refused and the connection closed: what follows on it cannot be told apart any more.
 class RefusedProbe : public WebApiTest, public testing::WithParamInterface<Probe> {};
 
@@ -104,6 +112,9 @@ const std::vector<Probe> kHeaderProbes = {
     {"TwoThousandFields", kPost + Fields(2'000) + "\r\n", 431},
     {"OneFieldOverTheLimit", kPost + Fields(100) + "\r\n", 431},
     {"CookieOf1MB", kPost + "Cookie: " + std::string(1'048'576, 'a') + "\r\n\r\n", 431},
+    {"TenThousandCookies", kPost + Cookies(10'000) + "\r\n", 431},
+    {"ForeignHostOfAPersonLoggedIn",
+     "POST /webapi/VORN.Test.Echo/1/get HTTP/1.1\r\n" VORN_TEST_LOGIN "Host: evil.example\r\n\r\n", 421},
     {"HeaderOneByteOverTheLimit", kPost + "X: " + std::string(8192 - 24 + 1, 'a') + "\r\n\r\n", 431},
 };
 

@@ -155,27 +155,14 @@ TEST_F(AddressLimitTest, AFloodIsLoggedInAFewLines) {
   EXPECT_LE(lines, 10U);
 }
 
-/// Clock ticks of processor time that the process has used.
-long ProcessorTime(pid_t process) {
-  std::ifstream file("/proc/" + std::to_string(process) + "/stat");
-  std::string word;
-  long user = 0;
-  long system = 0;
-  for (int field = 1; field <= 13; ++field) {
-    file >> word;
-  }
-  file >> user >> system;
-  return user + system;
-}
-
 TEST(Idleness, CostsNoProcessorTime) {
   ServerProcess server;
   HttpClient client(server.Port());
   EXPECT_EQ(client.Exchange(CallBytes("VORN.Test.Echo/1/get")).status, 200);
   std::this_thread::sleep_for(milliseconds(400)); // threads that watched the call go to sleep
-  const long before = ProcessorTime(server.Pid());
+  const long before = server.ProcessorTime();
   std::this_thread::sleep_for(milliseconds(1'000));
-  EXPECT_LE(ProcessorTime(server.Pid()) - before, 2); // of 100 a second
+  EXPECT_LE(server.ProcessorTime() - before, 2); // of 100 a second
   EXPECT_EQ(server.Stop(), 0);
 }
 
@@ -194,9 +181,9 @@ TEST(DescriptorLimit, RunningOutIsSurvivedWithoutABusyLoop) {
   }
   EXPECT_TRUE(server.LogShows("no connection can be accepted: Too many open files"));
   EXPECT_EQ(clients.front()->Exchange(CallBytes("VORN.Test.Echo/1/get")).status, 200) << server.Log();
-  const long before = ProcessorTime(server.Pid());
+  const long before = server.ProcessorTime();
   std::this_thread::sleep_for(milliseconds(1'000));
-  EXPECT_LT(ProcessorTime(server.Pid()) - before, 20); // of 100 a second
+  EXPECT_LT(server.ProcessorTime() - before, 20); // of 100 a second
   for (int index = 0; index < 40; ++index) {
     clients.erase(clients.begin());
   }

@@ -127,6 +127,31 @@ bool ServerProcess::LogShows(const std::string &text, std::chrono::milliseconds 
   return changed_.wait_for(lock, limit, [this, &text] { return log_.find(text) != std::string::npos; });
 }
 
+size_t ServerProcess::PrivateMemory() const {
+  std::ifstream file("/proc/" + std::to_string(pid_) + "/smaps_rollup");
+  size_t sum = 0;
+  for (std::string word; file >> word;) {
+    if (word == "Private_Clean:" || word == "Private_Dirty:") {
+      size_t kilobytes = 0;
+      file >> kilobytes;
+      sum += kilobytes;
+    }
+  }
+  return sum;
+}
+
+long ServerProcess::ProcessorTime() const {
+  std::ifstream file("/proc/" + std::to_string(pid_) + "/stat");
+  std::string word;
+  long user = 0;
+  long system = 0;
+  for (int field = 1; field <= 13; ++field) {
+    file >> word;
+  }
+  file >> user >> system;
+  return user + system;
+}
+
 void ServerProcess::Signal(int signal) const {
   kill(pid_, signal);
 }

@@ -39,6 +39,8 @@ public:
   /// The port that it says it serves; 0 when it ended before that.
   int Port() const { return port_; }
   pid_t Pid() const { return pid_; }
+  size_t PrivateMemory() const; ///< kilobytes that it holds for itself
+  long ProcessorTime() const;   ///< clock ticks, 100 a second, that it has used
 
   /// What it has logged so far, the start's messages among it.
   std::string Log() const;

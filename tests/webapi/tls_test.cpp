@@ -1,8 +1,8 @@
 // The same server over TLS.
+#include "tests/webapi/tls_client.h"
 #include "tests/webapi/webapi_fixture.h"
 
-#include <openssl/bio.h>
-#include <openssl/ssl.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 
 #include <fstream>
@@ -12,6 +12,7 @@
 using vorntest::Folder;
 using vorntest::HttpClient;
 using vorntest::ServerProcess;
+using vorntest::TlsClient;
 
 namespace {
 
@@ -25,22 +26,8 @@ protected:
 
   /// @return what the server answers to the bytes and then closes; empty when there is no handshake
   std::string Talk(int version, const std::string &bytes) const {
-    const std::unique_ptr<SSL_CTX, decltype(&SSL_CTX_free)> context(SSL_CTX_new(TLS_client_method()), SSL_CTX_free);
-    SSL_CTX_set_security_level(context.get(), 0); // what the client would refuse itself is the server's to refuse
-    SSL_CTX_set_min_proto_version(context.get(), version);
-    SSL_CTX_set_max_proto_version(context.get(), version);
-    const std::unique_ptr<BIO, decltype(&BIO_free_all)> connection(BIO_new_ssl_connect(context.get()), BIO_free_all);
-    BIO_set_conn_hostname(connection.get(), ("127.0.0.1:" + std::to_string(server_.Port())).c_str());
-    if (BIO_do_handshake(connection.get()) != 1) {
-      return {};
-    }
-    BIO_write(connection.get(), bytes.data(), static_cast<int>(bytes.size()));
-    std::string answer;
-    char buffer[4096];
-    for (int got = 0; (got = BIO_read(connection.get(), buffer, sizeof buffer)) > 0;) {
-      answer.append(buffer, static_cast<size_t>(got));
-    }
-    return answer;
+    TlsClient client(server_.Port(), version);
+    return client.Handshake() && client.Send(bytes) ? client.ReadAll() : "";
   }
 
   Folder folder_;
@@ -61,6 +48,7 @@ TEST_F(TlsTest, OneDotTwoAndOneDotThreeAreSpokenAndNothingOlder) {
     const std::string answer = Talk(version, LoginBytes(password));
     EXPECT_EQ(answer.substr(0, 12), "HTTP/1.1 200") << answer;
     EXPECT_NE(answer.find("Set-Cookie: __Host-vorn-session="), std::string::npos);
+    EXPECT_NE(answer.find("\r\nStrict-Transport-Security: max-age=31536000\r\n"), std::string::npos);
     EXPECT_NE(answer.find("; Path=/; HttpOnly; SameSite=Strict; Secure\r\n"), std::string::npos);
   }
   EXPECT_EQ(Talk(TLS1_VERSION, LoginBytes(password)), "");
@@ -95,6 +83,48 @@ TEST_F(TlsTest, PlainHttpAndSilenceAreCut) {
   half.Send("\x16\x03\x01");
   EXPECT_TRUE(silent.ClosedByServer(std::chrono::seconds(5)));
   EXPECT_TRUE(half.ClosedByServer(std::chrono::seconds(5)));
+}
+
+TEST_F(TlsTest, RenegotiationIsRefused) {
+  TlsClient client(server_.Port(), TLS1_2_VERSION);
+  ASSERT_TRUE(client.Handshake());
+  for (int round = 0; round < 3; ++round) {
+    SSL_renegotiate(client.Handle());
+    EXPECT_NE(SSL_do_handshake(client.Handle()), 1);
+  }
+  EXPECT_EQ(Talk(TLS1_2_VERSION, "GET / HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n").substr(0, 9),
+            "HTTP/1.1 ");
+}
+
+class SlowTlsTest : public testing::Test {
+protected:
+  SlowTlsTest() : server_({.options = {"--tls", "yes", "--write-time", "700ms"}}) {}
+  void SetUp() override { ASSERT_NE(server_.Port(), 0) << server_.Log(); }
+  void TearDown() override { EXPECT_EQ(server_.Stop(), 0) << server_.Log(); }
+
+  ServerProcess server_;
+};
+
+TEST_F(SlowTlsTest, AClientThatTakesNothingIsCut) {
+  TlsClient client(server_.Port(), 0, 4'096);
+  ASSERT_TRUE(client.Handshake());
+  ASSERT_TRUE(client.Send(vorntest::CallBytes("VORN.Test.Large/1/get", R"({"bytes":30000000})")));
+  EXPECT_TRUE(server_.LogShows("a client did not take its answer and was cut"));
+}
+
+TEST_F(SlowTlsTest, HalfARecordCostsNoProcessorTime) {
+  std::vector<std::unique_ptr<HttpClient>> clients;
+  for (const char *bytes : {"\x16", "\x16\x03\x01", "\x16\x03\x01\x02", "\x16\x03\x01\x02\x01\x01"}) {
+    clients.push_back(std::make_unique<HttpClient>(server_.Port()));
+    ASSERT_TRUE(clients.back()->Send(bytes));
+  }
+  TlsClient established(server_.Port());
+  ASSERT_TRUE(established.Handshake());
+  ASSERT_EQ(send(SSL_get_fd(established.Handle()), "\x17\x03\x03\x01\x01x", 6, MSG_NOSIGNAL), 6);
+  std::this_thread::sleep_for(std::chrono::milliseconds(400)); // what watched the handshake goes to sleep
+  const long before = server_.ProcessorTime();
+  std::this_thread::sleep_for(std::chrono::milliseconds(1'000));
+  EXPECT_LE(server_.ProcessorTime() - before, 3); // of 100 a second
 }
 
 } // namespace
