@@ -28,7 +28,7 @@ struct Key {
 
 constexpr size_t kDay = 86'400'000;
 
-constexpr std::array<Key, 37> kKeys = {{
+constexpr std::array<Key, 38> kKeys = {{
     {"listen", &Config::listen, 0, 0, "address and port; port 0: any free one; [::1]:8080 for IPv6"},
     {"module", &Config::module, 0, 0, "the shared library to serve"},
     {"description", &Config::description, 0, 0, "what /openapi.json says of the module's rows, a JSON file"},
