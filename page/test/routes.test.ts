@@ -9,6 +9,7 @@ describe('a static route', () => {
     expect(judgeRoute(form(), 'ipv4')).toBeUndefined();
     expect(judgeRoute(form({ length: '255.255.0.0' }), 'ipv4')).toBeUndefined();
     expect(judgeRoute(six({ length: '/48' }), 'ipv6')).toBeUndefined();
+    expect(judgeRoute(form({ ip: '0.0.0.0', length: '1' }), 'ipv4')).toBeUndefined(); // larger than what is reserved in it
   });
   it.each([
     ['noAddress', form({ ip: '10.1.0' })],

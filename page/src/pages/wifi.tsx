@@ -2,16 +2,18 @@
 import type { JSX } from 'preact';
 import { useState } from 'preact/hooks';
 
+import { ApiError } from '../api';
 import { parseMac, sameMac } from '../logic/mac';
 import { type Device, type FilterEntry, getMacFilter, type MacFilter, setMacFilter } from '../router';
 import { format, t } from '../text';
-import { announce, ErrorNotice, Notice, Spinner, useAction, useLoad } from '../ui';
+import { announce, Button, ErrorNotice, Notice, Spinner, useAction, useLoad } from '../ui';
 import { deviceName, SaveBar, useDevices } from './shared';
 import { AddDevices } from './wifi/add';
 import { FilterList } from './wifi/list';
 import './shared.css';
 import './wifi/wifi.css';
 
+const FAILED = 4300; // the router's code when there is no adapter to ask
 const POLICIES = ['disable', 'allow', 'deny'] as const;
 type Policy = (typeof POLICIES)[number];
 
@@ -35,11 +37,19 @@ export function WifiPage(): JSX.Element {
   return (
     <div class="stack">
       <p class="lead">{texts.lead}</p>
-      {filter.error !== undefined && (
-        <>
-          <ErrorNotice error={filter.error} retry={filter.reload} />
-          <p>{texts.noRadio}</p>
-        </>
+      {filter.error instanceof ApiError && filter.error.code === FAILED ? (
+        <Notice
+          kind="error"
+          actions={
+            <Button icon="refresh" busy={filter.loading} onClick={filter.reload}>
+              {t().common.retry}
+            </Button>
+          }
+        >
+          {texts.noRadio}
+        </Notice>
+      ) : (
+        <ErrorNotice error={filter.error} retry={filter.reload} />
       )}
       {!filter.data && filter.loading && <Spinner />}
       {filter.data && <Filter filter={filter.data} devices={devices.data ?? []} onStored={filter.reload} />}

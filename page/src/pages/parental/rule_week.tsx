@@ -5,7 +5,7 @@ import { useState } from 'preact/hooks';
 import { copyDay, cutHours, dayOrder, isCut, normalize, paint, type Slot } from '../../logic/schedule';
 import type { TimeRule } from '../../router';
 import { format, t } from '../../text';
-import { announce, Button, Notice, Select } from '../../ui';
+import { announce, Button, Select } from '../../ui';
 import { Switch } from '../shared';
 import { WeekGrid } from './week_grid';
 import { dayText, dayWords, stateText } from './words';
@@ -78,7 +78,6 @@ export function RuleWeek({ rule, name, now, onChange }: RuleWeekProps): JSX.Elem
         <summary>{texts.helpTitle}</summary>
         <p class="muted">{texts.help}</p>
       </details>
-      {cutHours(rule.schedule) === 0 && <Notice>{texts.freeAlways}</Notice>}
     </section>
   );
 }
