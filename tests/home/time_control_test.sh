@@ -174,6 +174,9 @@ check "the stored rules are enforced" is_enforced "[\"$laptop\"]"
 check "and can be removed" set_rules '[]'
 check "with nothing left" nothing_is_enforced
 
+# Rules for all hours need no moved clock any more, and a server that starts with the library that moves it would hang:
+# the library and the server's allocator wait for one another.
+at router rm /etc/ld.so.preload
 for delay in 0.00 0.02 0.04 0.06 0.08 0.10 0.13 0.16 0.20 0.25; do
   set_rules "[$(rule "$laptop" "$(week 1)")]" &
   setting=$!
