@@ -78,6 +78,7 @@ bool Fill(int count) {
   }
   store.Write({}, old);
   std::vector<Device> devices;
+  devices.reserve(static_cast<size_t>(count));
   for (int number = 0; number < count; ++number) {
     devices.push_back(DeviceOf(number));
   }
@@ -144,9 +145,10 @@ bool PrintPlain(const char *path) {
     int rounds = 0;
     size_t written = 0;
     double used = 0;
-    for (; used < kRunMicroseconds; used = ProcessorMicroseconds() - begin) {
+    while (used < kRunMicroseconds) {
       written += WritePlainly(records, builder).size();
       ++rounds;
+      used = ProcessorMicroseconds() - begin;
     }
     if (written == 0) {
       return false;
@@ -168,6 +170,6 @@ int main(int argc, char **argv) {
   if (std::strcmp(argv[1], "plain") == 0) {
     return PrintPlain(argv[2]) ? 0 : 1;
   }
-  const int count = std::atoi(argv[2]);
+  const auto count = static_cast<int>(std::strtol(argv[2], nullptr, 10));
   return (std::strcmp(argv[1], "fill") == 0 ? Fill(count) : PutPresence(count)) ? 0 : 1;
 }

@@ -81,6 +81,7 @@ std::optional<std::string> BearerToken(const RequestHead &head) {
 
 std::vector<std::string> OwnPaths() {
   std::vector<std::string> paths;
+  paths.reserve(kOwnPaths.size());
   for (const OwnPath &each : kOwnPaths) {
     paths.emplace_back(each.path);
   }
