@@ -18,6 +18,17 @@ namespace hosttest {
 using vornnetwork::network::IP_TYPE;
 using vornnetwork::network::StaticRoute;
 
+namespace {
+
+// The kernel says some things of a link that has come up later than "up" itself, from a thread of its own: the carrier,
+// and the link-local and multicast routes, here of both ends of three pairs.
+bool LinksAreSettled() {
+  return Shell("ip -4 route show table all | grep linkdown | wc -l") == "0\n" &&
+         Shell("ip -6 route show table all | grep -E '^(fe80::/64|multicast ff00::/8) ' | wc -l") == "12\n";
+}
+
+} // namespace
+
 void RoutesTest::SetUp() {
   RemoveLinks();
   std::filesystem::remove_all("/etc/iproute2/config");
@@ -29,7 +40,7 @@ void RoutesTest::SetUp() {
     Shell(std::string("n=") + name + "; ip link add $n type veth peer name ${n}p && ip link set ${n}p up && " +
           "ip link set $n up && ip addr add " + four + " dev $n && ip addr add " + six + " nodad dev $n");
   }
-  Sleep(20); // the carrier's news
+  ASSERT_TRUE(Eventually(5000, LinksAreSettled)) << AllRoutes();
   TakeLogLines();
 }
 
