@@ -122,13 +122,11 @@ function Editor({ stored, devices, onStored }: EditorProps): JSX.Element {
       {kept(rules) !== kept(stored) && (
         <SaveBar
           text={texts.changed}
-          save={t().common.save}
           busy={busy}
+          error={error}
           onSave={() => void store()}
           onDiscard={() => setDraft(undefined)}
-        >
-          <ErrorNotice error={error} />
-        </SaveBar>
+        />
       )}
       {removed !== undefined && rules[removed] && (
         <Confirm

@@ -1,11 +1,11 @@
 // What several of the router's pages have.
-import type { ComponentChildren, JSX } from 'preact';
+import type { JSX } from 'preact';
 import { useEffect, useRef } from 'preact/hooks';
 
 import { compareAddresses, parseIpv4 } from '../logic/ip';
 import { type Device, getDevices } from '../router';
 import { t } from '../text';
-import { Button, Field, type Load, useLoad } from '../ui';
+import { Button, ErrorNotice, Field, type Load, useLoad } from '../ui';
 
 export const deviceName = (device: Pick<Device, 'hostname' | 'ip' | 'mac'>): string =>
   device.hostname || device.ip || device.mac;
@@ -49,25 +49,37 @@ export function Switch(props: {
   );
 }
 
-/** Stands at the window's edge while something is not saved. */
+/** The buttons of a dialog whose form is saved. */
+export function SaveActions(props: { busy: boolean; disabled?: boolean; onCancel: () => void }): JSX.Element {
+  return (
+    <>
+      <Button onClick={props.onCancel}>{t().common.cancel}</Button>
+      <Button kind="primary" type="submit" busy={props.busy} disabled={props.disabled ?? false}>
+        {t().common.save}
+      </Button>
+    </>
+  );
+}
+
+/** Stands at the window's edge while something is not saved; `error` is why it could not be. */
 export function SaveBar(props: {
   text: string;
-  save: string;
+  save?: string;
   busy: boolean;
+  error: unknown;
   onSave: () => void;
   onDiscard: () => void;
-  children?: ComponentChildren;
 }): JSX.Element {
   return (
     <div class="save-bar" role="region" aria-label={props.text}>
-      {props.children}
+      <ErrorNotice error={props.error} />
       <span class="save-text">{props.text}</span>
       <div class="row">
         <Button onClick={props.onDiscard} disabled={props.busy}>
           {t().internet.discard}
         </Button>
         <Button kind="primary" busy={props.busy} onClick={props.onSave}>
-          {props.save}
+          {props.save ?? t().common.save}
         </Button>
       </div>
     </div>

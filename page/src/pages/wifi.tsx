@@ -124,13 +124,11 @@ function Filter({ filter, devices, onStored }: FilterProps): JSX.Element {
       {isChanged && (
         <SaveBar
           text={texts.changed}
-          save={t().common.save}
           busy={busy}
+          error={error}
           onSave={() => void store()}
           onDiscard={() => setDraft(undefined)}
-        >
-          <ErrorNotice error={error} />
-        </SaveBar>
+        />
       )}
     </>
   );

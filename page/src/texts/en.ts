@@ -1,4 +1,5 @@
-// English. The other languages have the type of this one, so that none lacks a text.
+// English. The other languages have the type of this one, so that none lacks a text. All words of a language are in
+// one file, however long: whoever translates needs no other.
 export const en = {
   common: {
     router: 'Router',

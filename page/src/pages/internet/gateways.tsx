@@ -53,11 +53,10 @@ export function Gateways({ family }: { family: Family }): JSX.Element {
           text={texts.changed}
           save={texts.saveOrder}
           busy={busy}
+          error={saveError}
           onSave={() => void store()}
           onDiscard={() => setOrder(undefined)}
-        >
-          <ErrorNotice error={saveError} />
-        </SaveBar>
+        />
       )}
     </section>
   );

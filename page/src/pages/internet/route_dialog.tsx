@@ -21,7 +21,7 @@ import {
 import { testRoute } from '../../router';
 import { errorText, format, t } from '../../text';
 import { Button, Dialog, ErrorNotice, Icon, Select, TextField, useAction } from '../../ui';
-import { Switch } from '../shared';
+import { SaveActions, Switch } from '../shared';
 
 const PAUSE = 350; // ms after the last key before the router is asked
 const REFUSED = 4300;
@@ -109,14 +109,7 @@ export function RouteDialog({ family, rules, at, interfaces, onStore, onClose }:
       title={old ? texts.editTitle : texts.addTitle}
       onClose={onClose}
       onSubmit={() => void submit()}
-      actions={
-        <>
-          <Button onClick={onClose}>{t().common.cancel}</Button>
-          <Button kind="primary" type="submit" busy={busy} disabled={blocked}>
-            {t().common.save}
-          </Button>
-        </>
-      }
+      actions={<SaveActions busy={busy} disabled={blocked} onCancel={onClose} />}
     >
       <div class="row fields">
         <TextField

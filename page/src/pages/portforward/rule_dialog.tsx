@@ -5,8 +5,8 @@ import { useState } from 'preact/hooks';
 import { type Fault, type Forward, type ForwardField, judgeForwards, type Lan, protocolOf } from '../../logic/forwards';
 import type { Device } from '../../router';
 import { t } from '../../text';
-import { Button, Dialog, ErrorNotice, Notice, Select, TextField, useAction } from '../../ui';
-import { DevicePick, Switch } from '../shared';
+import { Dialog, ErrorNotice, Notice, Select, TextField, useAction } from '../../ui';
+import { DevicePick, SaveActions, Switch } from '../shared';
 import { faultText, managementPorts } from './words';
 
 interface RuleDialogProps {
@@ -70,14 +70,7 @@ export function RuleDialog({ rules, at, devices, lans, onStore, onClose }: RuleD
       title={old ? texts.editTitle : texts.addTitle}
       onClose={onClose}
       onSubmit={() => void submit()}
-      actions={
-        <>
-          <Button onClick={onClose}>{t().common.cancel}</Button>
-          <Button kind="primary" type="submit" busy={busy}>
-            {t().common.save}
-          </Button>
-        </>
-      }
+      actions={<SaveActions busy={busy} onCancel={onClose} />}
     >
       <TextField
         label={texts.name}
