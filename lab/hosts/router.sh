@@ -32,7 +32,9 @@ start() {
   /usr/vorn/sbin/vorntimecontrol --restore
   /usr/vorn/sbin/vorntopology start
   launch vornroutes /usr/vorn/sbin/vornroutes watch # as vorn-routes.service does
-  ip address add 2001:db8:2::1/64 dev lbr0 # the provider routes this prefix here; a switch takes it away with lbr0
+  # The provider routes this prefix here; a switch takes it away with lbr0. Nobody else has the address, and until a look
+  # for a duplicate had ended, dnsmasq would advertise no prefix.
+  ip address add 2001:db8:2::1/64 dev lbr0 nodad
   dnsmasq --conf-file=/etc/dnsmasq.d/vorn.conf --dhcp-hostsfile=/etc/vorn/addresses --no-ping \
     --log-facility="$LOG/router-dnsmasq"
   launch vorndevices /usr/vorn/sbin/vorndevices watch # as vorn-devices.service does

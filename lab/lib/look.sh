@@ -20,11 +20,11 @@ topology_answer() { # prints the data of "get", version 2
   call Topology 2 get | sed -n 1p | jq -c .data
 }
 
-eventually() { # SECONDS COMMAND...: tries until it succeeds
+eventually() { # SECONDS COMMAND...: tries until it succeeds, for at least SECONDS
   local limit=$((SECONDS + $1))
   shift
   until "$@"; do
-    [ "$SECONDS" -lt "$limit" ] || return 1
+    [ "$SECONDS" -le "$limit" ] || return 1 # SECONDS is whole: it may be about to turn
     sleep 0.1
   done
 }

@@ -99,7 +99,7 @@ stream=$(rule 6000 both $LAPTOP 6000 true Stream)
 start_receiving() { # NAME HOST PROTOCOL SECONDS [OWN-PORT]
   traffic "$2" receive "$3" "$wan" 6000 "$4" ${5:+"$5"} >"$seen/$1" &
   received=$!
-  eventually 3 test -s "$seen/$1"
+  eventually 5 test -s "$seen/$1"
 }
 
 last_number() { grep -v closed "$seen/$1" | tail -n 1 | cut -d ' ' -f 1; }
