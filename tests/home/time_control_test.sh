@@ -103,6 +103,7 @@ check "until then nobody is cut" is_enforced '[]'
 check "the rules are told as they were set" same '["d4:3d:7e:11:22:33","3c:2a:f4:11:22:44"]' "$(rules | jq -c 'map(.mac)')"
 
 for host in laptop printer; do
+  need "the $host has IPv6" eventually 20 opens "$host" "$v6" # the router's advertisement may take its time
   download "$host" v4 "$v4"
   download "$host" v6 "$v6"
 done
