@@ -145,13 +145,20 @@ std::string_view TextOf(const Json::Value &value) {
   return value.getString(&begin, &end) ? std::string_view(begin, static_cast<size_t>(end - begin)) : "";
 }
 
+// Goes from element to element, as each that is looked up by its index is searched from the top of a tree. One that was
+// never set is not there, and null.
 void AppendArray(const Json::Value &array, std::string &out) {
   out += '[';
-  for (Json::ArrayIndex index = 0; index < array.size(); ++index) {
-    if (index > 0) {
-      out += ',';
+  Json::ArrayIndex next = 0;
+  for (auto element = array.begin(); element != array.end(); ++element, ++next) {
+    for (; next < element.index(); ++next) {
+      out += "null,";
     }
-    WriteJson(array[index], out);
+    WriteJson(*element, out);
+    out += ',';
+  }
+  if (next > 0) {
+    out.pop_back();
   }
   out += ']';
 }

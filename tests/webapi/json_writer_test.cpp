@@ -154,6 +154,16 @@ TEST(JsonWriter, WritesTheSameBytesAtTheLimits) {
   }
 }
 
+TEST(JsonWriter, ElementsThatWereNeverSetAreNull) {
+  Json::Value gaps(Json::arrayValue);
+  gaps[2] = "third";
+  EXPECT_EQ(Own(gaps), R"([null,null,"third"])");
+  gaps[5] = Json::Value(Json::arrayValue);
+  EXPECT_EQ(Own(gaps), Reference(gaps));
+  gaps.resize(9);
+  EXPECT_EQ(Own(gaps), Reference(gaps));
+}
+
 TEST(JsonWriter, AppendsAndStaysAscii) {
   std::string out = "x";
   Json::Value value;
