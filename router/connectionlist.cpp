@@ -14,6 +14,7 @@
 #include <array>
 #include <cstdio>
 #include <cstring>
+#include <memory_resource>
 #include <optional>
 #include <string_view>
 #include <unordered_map>
@@ -159,15 +160,16 @@ public:
   Json::Value *&At(std::string_view mac) { return byMac_[mac]; }
 
 private:
-  std::unordered_map<std::string_view, Json::Value *> byMac_;
+  std::pmr::monotonic_buffer_resource memory_; // one piece after the other: a long table's index stays together
+  std::pmr::unordered_map<std::string_view, Json::Value *> byMac_{&memory_};
 };
 
 // @return the MAC address of a record that has one of the right form, and an address; nothing otherwise
 std::optional<std::string_view> UsableMac(const Json::Value &record, const Expression &macPattern) {
-  if (!MemberOf(record, station::kMac).isString() || !record.isMember(station::kIp.c_str())) {
+  const auto mac = ViewOf(MemberOf(record, station::kMac));
+  if (!mac || !record.isMember(station::kIp.c_str())) {
     return std::nullopt;
   }
-  const auto mac = ViewOf(record[station::kMac]);
   const bool whole = mac->find('\0') == std::string_view::npos; // a NUL stands behind the view's end
   return whole && macPattern.Matches(mac->data()) ? mac : std::nullopt;
 }
@@ -385,6 +387,7 @@ bool ConnectionList::CombineJsonData(Json::Value &stations, Json::Value &arpStat
     } else if (MemberText(wired, station::kNetif).find("br") != std::string::npos) {
       (*known)[station::kIp] = MemberText(wired, station::kIp);
     }
+    wired = Json::Value(); // while it is at hand: freed later, a long table would be fetched from memory once more
   }
   return true;
 }
