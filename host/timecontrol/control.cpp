@@ -11,6 +11,7 @@
 #include <sys/file.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdio>
@@ -81,6 +82,25 @@ int Load(const MacSet &cut) {
   return 0;
 }
 
+// Where a change of the rules writes once the old ones have been ended.
+constexpr std::array kFolders = {"/etc/parental", "/etc/cron.d"};
+constexpr off_t kRoom = off_t{256} * 1024; // bytes: the rules of more devices than a home has
+
+bool TakesFiles(const char *folder) {
+  const UniqueFd file(open(folder, O_TMPFILE | O_WRONLY | O_CLOEXEC, 0600)); // never has a name
+  const bool taken = file.IsOpen() && fallocate(file.Get(), 0, 0, kRoom) == 0;
+  if (taken || errno == EOPNOTSUPP || errno == EISDIR || errno == ENOENT) {
+    return true; // or nobody can tell before: the file system knows neither of the two, or the folder is still to be
+                 // made
+  }
+  LogError("time control: stays on, %s takes no files: %s", folder, std::strerror(errno));
+  return false;
+}
+
+int TurnOff(State &state) {
+  return state.Set(false) == 0 && RemoveTable() == 0 ? 0 : -1;
+}
+
 std::string SlotText(int slot) {
   constexpr std::array kDays = {"Sunday", "Monday", "Tuesday", "Wednesday", "Thursday", "Friday", "Saturday"};
   char text[32];
@@ -128,9 +148,14 @@ int ScheduleTimeControl() {
   return ReadTable() == cut ? 0 : Load(cut);
 }
 
+// A change of the rules begins here. On a disk that takes nothing the change would end here too, and nobody would be
+// cut any more, whatever the stored rules say: then they stay as they are.
 int DisableTimeControl() {
   State state;
-  return state.IsLocked() && state.Set(false) == 0 && RemoveTable() == 0 ? 0 : -1;
+  if (!state.IsLocked() || (state.IsOn() && !std::all_of(kFolders.begin(), kFolders.end(), TakesFiles))) {
+    return -1;
+  }
+  return TurnOff(state);
 }
 
 int RestoreTimeControl() {
@@ -138,7 +163,11 @@ int RestoreTimeControl() {
   if (RestoreFiles(enforce) != 0) {
     return -1;
   }
-  return enforce ? ApplyTimeControl() : DisableTimeControl();
+  if (enforce) {
+    return ApplyTimeControl();
+  }
+  State state;
+  return state.IsLocked() ? TurnOff(state) : -1;
 }
 
 int ShowTimeControl(std::ostream &out) {

@@ -3,6 +3,7 @@ import type { JSX } from 'preact';
 import { useEffect, useRef } from 'preact/hooks';
 
 import { ApiError, logout, resume } from './api';
+import { bringIntoSight, lessMotion } from './logic/sight';
 import { pages, type PageEntry } from './pages';
 import { FirstPassword, SignIn, SignInAgain } from './pages/signin';
 import { formatRoute, route } from './route';
@@ -53,7 +54,8 @@ function Frame(): JSX.Element {
     document.title = `${title} · ${t().common.router}`;
   }, [title]);
   useEffect(() => {
-    if (shown.current !== page.id) head.current?.focus(); // a screen reader then reads where one is
+    // A screen reader then reads where one is. The window goes to its top by itself, and nothing else that glides is stopped.
+    if (shown.current !== page.id) head.current?.focus({ preventScroll: true });
     shown.current = page.id;
     window.scrollTo(0, 0);
   }, [page.id]);
@@ -76,13 +78,21 @@ function Frame(): JSX.Element {
 
 function Side({ current }: { current: string }): JSX.Element {
   const [busy, leave, error] = useAction(logout);
+  const links = useRef<HTMLElement>(null);
+  const arrived = useRef(false);
+  const texts = t();
+  useEffect(() => {
+    // On a telephone the links are a row that moves sideways. Another language makes them wider or narrower.
+    bringIntoSight(links.current?.querySelector('[aria-current]'), arrived.current && !lessMotion());
+    arrived.current = true;
+  }, [current, texts]);
   return (
     <header class="side">
       <div class="brand">
         <Icon name="topology" size={22} />
         <span>{t().common.router}</span>
       </div>
-      <nav aria-label={t().nav.label}>
+      <nav ref={links} aria-label={t().nav.label}>
         <ul>
           {pages.map((each) => (
             <li key={each.id}>

@@ -1,5 +1,5 @@
 // Signing in, the first password, the session's end, tokens, languages.
-import { check, equal, finish, firstPassword, holds, looks, open, password, screenshot, signIn } from './browser.mjs';
+import { check, equal, finish, firstPassword, holds, looks, NARROW, open, password, screenshot, signIn, WIDE } from './browser.mjs';
 
 const page = await open();
 
@@ -87,6 +87,29 @@ await check('the appearance changes and stays', async () => {
   await page.getByRole('heading', { name: 'Account', level: 1 }).waitFor();
   holds((await background()) !== light, 'dark is another colour');
   await page.locator('.side').getByLabel('Appearance').selectOption('auto');
+});
+await check('on a telephone the navigation shows the page that one is on', async () => {
+  const shown = (id) =>
+    page.waitForFunction((page) => {
+      const link = document.querySelector('.side nav a[aria-current]');
+      const [inner, outer] = [link, link?.closest('nav')].map((each) => each?.getBoundingClientRect());
+      // A row's place is a whole number of pixels, its width is not.
+      return link?.hash === `#/${page}` && inner.left > outer.left - 1 && inner.right < outer.right + 1;
+    }, id);
+  await page.setViewportSize(NARROW);
+  await page.reload();
+  await shown('account'); // the last one
+  for (const reducedMotion of ['reduce', 'no-preference']) {
+    await page.emulateMedia({ reducedMotion });
+    for (const id of ['devices', 'topology', 'account']) {
+      await page.evaluate((to) => (location.hash = `#/${to}`), id);
+      await shown(id);
+    }
+  }
+  equal(await page.evaluate(() => window.scrollY), 0, 'pixels that the page itself has moved');
+  await screenshot(page, 'navigation-narrow');
+  await page.emulateMedia({ reducedMotion: 'reduce' });
+  await page.setViewportSize(WIDE);
 });
 await check('signing out ends the session', async () => {
   await page.getByRole('button', { name: 'Sign out' }).click();

@@ -16,6 +16,7 @@
 #include <array>
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
 #include <sstream>
 #include <thread>
 
@@ -238,6 +239,25 @@ TEST_F(TimeControl, Disable_IsRightHoweverOften) {
   EXPECT_EQ(vornhost::DisableTimeControl(), 0);
   EXPECT_EQ(vornhost::DisableTimeControl(), 0);
   EXPECT_EQ(Ruleset(), "");
+}
+
+// The change that it begins could not be written, and the stored rules would be enforced by nobody.
+TEST_F(TimeControl, Disable_OnADiskThatTakesNothingLeavesTheRulesEnforced) {
+  std::filesystem::create_directories("/etc/parental");
+  WriteText(kRules, Rule(kLaptop, '1'));
+  ASSERT_EQ(vornhost::ApplyTimeControl(), 0);
+  for (const char *folder : {"/etc/parental", "/etc/cron.d"}) {
+    for (const char *options : {"size=64k", "ro"}) {
+      const std::string mount = std::string("/bin/mount -t tmpfs -o ") + options + " small " + folder;
+      Output(mount.c_str());
+      EXPECT_EQ(vornhost::DisableTimeControl(), -1) << mount;
+      EXPECT_THAT(ReadTable(), Optional(Eq(MacSet{kLaptop})));
+      EXPECT_THAT(TakeLogLines(), Contains(HasSubstr(std::string("stays on, ") + folder + " takes no files: ")));
+      Output((std::string("/bin/umount ") + folder).c_str());
+    }
+  }
+  EXPECT_EQ(vornhost::DisableTimeControl(), 0);
+  EXPECT_FALSE(ReadTable());
 }
 
 TEST_F(TimeControl, Show_TellsWhatIsCutAndUntilWhen) {
