@@ -12,7 +12,15 @@ namespace {
 constexpr int kBusyLimit = 5000;
 
 [[noreturn]] void Fail(sqlite3 *connection, const char *what) {
-  throw DatabaseError(std::string(what) + ": " + (connection != nullptr ? sqlite3_errmsg(connection) : "no memory"));
+  if (connection == nullptr) {
+    throw DatabaseError(std::string(what) + ": no memory");
+  }
+  const std::string text = std::string(what) + ": " + sqlite3_errmsg(connection);
+  const int kind = sqlite3_errcode(connection) & 0xff; // without the extension that says where
+  if (kind == SQLITE_CORRUPT || kind == SQLITE_NOTADB) {
+    throw DamagedDatabase(text);
+  }
+  throw DatabaseError(text);
 }
 
 void Check(sqlite3 *connection, int result, const char *what) {
@@ -29,7 +37,11 @@ void Statement::Deleter::operator()(sqlite3_stmt *statement) const {
 
 Statement::Statement(Database &database, const char *sql) : connection_(database.raw_.get()) {
   sqlite3_stmt *raw = nullptr;
-  Check(connection_, sqlite3_prepare_v2(connection_, sql, -1, &raw, nullptr), "device store");
+  const int result = sqlite3_prepare_v2(connection_, sql, -1, &raw, nullptr);
+  if (result == SQLITE_ERROR) { // the text is right: the tables are others
+    throw DamagedDatabase(std::string("device store: ") + sqlite3_errmsg(connection_));
+  }
+  Check(connection_, result, "device store");
   raw_.reset(raw);
 }
 
@@ -82,6 +94,21 @@ Database::Database(const std::string &path) {
 
 void Database::Execute(const char *sql) {
   Check(raw_.get(), sqlite3_exec(raw_.get(), sql, nullptr, nullptr, nullptr), "device store");
+}
+
+void Database::CheckForm() {
+  Statement check(*this, "PRAGMA quick_check(1)");
+  const std::string answer = check.Step() ? check.Text(0) : "";
+  if (answer == "ok") {
+    return;
+  }
+  // What this check finds it tells as text, a disk that fails too.
+  for (const char *unread : {"unable to get the page", "failed to get page"}) {
+    if (answer.find(unread) != std::string::npos) {
+      throw DatabaseError("device store: " + answer);
+    }
+  }
+  throw DamagedDatabase("device store: " + answer);
 }
 
 int64_t Database::DataVersion() {

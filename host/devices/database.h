@@ -17,6 +17,13 @@ public:
   using std::runtime_error::runtime_error;
 };
 
+/// The file is no database, or its pages do not fit together: reading it again will not help. A disk that fails, a
+/// lock, a lack of memory or of room are none of that.
+class DamagedDatabase : public DatabaseError {
+public:
+  using DatabaseError::DatabaseError;
+};
+
 class Database;
 
 /// A prepared statement. Parameters count from 1, columns from 0.
@@ -48,6 +55,8 @@ public:
   explicit Database(const std::string &path);
 
   void Execute(const char *sql);
+  /// Reads all of it. Throws DamagedDatabase when the pages do not fit together.
+  void CheckForm();
   /// A number that another connection's commit changes, and this one's own does not.
   int64_t DataVersion();
   int Changes() const;

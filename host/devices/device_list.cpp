@@ -119,11 +119,19 @@ class StoreReader {
 public:
   std::shared_ptr<const StoredDevices> Get() {
     const std::lock_guard lock(mutex_);
-    const FileMark mark = MarkOf(kDeviceStore);
-    if (!store_ || mark.device != mark_.device || mark.node != mark_.node) {
+    try {
+      return Read();
+    } catch (const DamagedDatabase &) {
+      store_.reset();
+      return Read();
+    }
+  }
+
+private:
+  std::shared_ptr<const StoredDevices> Read() {
+    if (!store_ || !store_->IsCurrent()) {
       devices_.reset();
       store_.emplace();
-      mark_ = MarkOf(kDeviceStore);
     }
     const int64_t version = store_->DataVersion();
     if (!devices_ || version != version_) {
@@ -133,10 +141,8 @@ public:
     return devices_;
   }
 
-private:
   std::mutex mutex_;
   std::optional<DeviceStore> store_;
-  FileMark mark_;
   int64_t version_ = 0;
   std::shared_ptr<const StoredDevices> devices_;
 };

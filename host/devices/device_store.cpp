@@ -1,12 +1,18 @@
 #include "host/devices/device_store.h"
 
-#include "host/utility/unique_fd.h"
+#include "host/devices/damaged_store.h"
+#include "host/devices/device_text.h"
+#include "host/devices/mac_address.h"
+#include "host/utility/file_turn.h"
 
 #include <fcntl.h>
-#include <sys/stat.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <cstring>
+#include <initializer_list>
 #include <unordered_map>
 
 namespace vornhost {
@@ -24,20 +30,78 @@ CREATE TABLE IF NOT EXISTS owner (mac TEXT PRIMARY KEY, name TEXT NOT NULL, type
 PRAGMA user_version = 1;
 )";
 
-// SQLite gives the files beside the store the store's own mode. The file is made without being opened: closing it would
-// take away the locks that this process's other connections have on it (POSIX record locks).
-std::string PreparedFile() {
+// A turn at the store lasts for a few reads and writes.
+constexpr char kStoreTurn[] = "/var/lib/vorn/devices.lock";
+constexpr std::chrono::seconds kTurnLimit{10};
+
+UniqueFd TakeStoreTurn() {
   mkdir(kStateFolder, 0700);
   const UniqueFd folder(open(kStateFolder, O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW));
   if (!folder.IsOpen() || fchmod(folder.Get(), 0700) != 0) {
     throw DatabaseError(std::string(kStateFolder) + ": " + std::strerror(errno));
   }
-  mknod(kDeviceStore, S_IFREG | 0600, 0);
+  try {
+    return TakeFileTurn(kStoreTurn, kTurnLimit);
+  } catch (const std::exception &error) {
+    throw DatabaseError(error.what());
+  }
+}
+
+// SQLite gives the files beside the store the store's own mode. The file is made without being opened: closing it would
+// take away the locks that this process's other connections have on it (POSIX record locks).
+struct stat PreparedFile() {
   struct stat info {};
-  if (lstat(kDeviceStore, &info) != 0 || !S_ISREG(info.st_mode)) { // a link would let its owner choose the file
+  if (lstat(kDeviceStore, &info) != 0 && errno == ENOENT) {
+    BringStore();
+    lstat(kDeviceStore, &info);
+  }
+  if (!S_ISREG(info.st_mode)) { // a link would let its owner choose the file
     throw DatabaseError(std::string(kDeviceStore) + " is no file");
   }
-  return kDeviceStore;
+  if (info.st_uid != geteuid()) {
+    throw DatabaseError(std::string(kDeviceStore) + " is somebody else's");
+  }
+  return info;
+}
+
+int64_t NumberOf(Database &database, const char *question) {
+  Statement answer(database, question);
+  return answer.Step() ? answer.Number(0) : 0;
+}
+
+constexpr char kReadDevices[] =
+    "SELECT mac, ip, netif, connection, manufacturer, sources, last_seen FROM device ORDER BY mac";
+constexpr char kReadFindings[] = "SELECT mac, source, name, type, model FROM finding";
+constexpr char kReadOwner[] = "SELECT mac, name, type FROM owner";
+
+void Prepare(Database &database) {
+  constexpr char kVersion[] = "PRAGMA user_version";
+  if (NumberOf(database, kVersion) == 0) {
+    if (NumberOf(database, "SELECT count(*) FROM sqlite_schema") != 0) {
+      throw DamagedDatabase("device store: it is another database");
+    }
+    Transaction transaction(database);
+    database.Execute(kTables);
+    transaction.Commit();
+  }
+  database.CheckForm();
+  if (NumberOf(database, kVersion) != kSchema) { // of a later version of the platform, which will need it again
+    throw DatabaseError(std::string(kDeviceStore) + " is of another version");
+  }
+  for (const char *read : {kReadDevices, kReadFindings, kReadOwner}) {
+    Statement(database, read).Step();
+  }
+  // In this mode readers never wait, and whoever dies leaves the last whole transaction.
+  database.Execute("PRAGMA journal_mode = WAL; PRAGMA wal_autocheckpoint = 256");
+  NumberOf(database, kVersion); // opens the journal: by its name, so within the turn
+}
+
+bool AreClean(const Statement &row, std::initializer_list<int> columns) {
+  return std::all_of(columns.begin(), columns.end(), [&row](int column) { return IsCleanText(row.Text(column)); });
+}
+
+bool IsDevices(const Statement &row) {
+  return ParseDeviceMac(row.Text(0)) == row.Text(0);
 }
 
 Device DeviceOf(const Statement &row) {
@@ -80,41 +144,57 @@ private:
 
 } // namespace
 
-DeviceStore::DeviceStore() : database_(PreparedFile()) {
-  Prepare();
+DeviceStore::DeviceStore() : opened_(Open()) {}
+
+DeviceStore::Opened DeviceStore::Open() {
+  const UniqueFd turn = TakeStoreTurn();
+  return OpenInTurn();
 }
 
-void DeviceStore::Prepare() {
-  // In this mode readers never wait, and whoever dies leaves the last whole transaction.
-  database_.Execute("PRAGMA journal_mode = WAL; PRAGMA wal_autocheckpoint = 256");
-  const auto schema = [this] {
-    Statement version(database_, "PRAGMA user_version");
-    return version.Step() ? version.Number(0) : 0;
-  };
-  if (schema() == 0) {
-    Transaction transaction(database_);
-    database_.Execute(kTables);
-    transaction.Commit();
+DeviceStore::Opened DeviceStore::OpenInTurn() {
+  for (bool again = false;; again = true) {
+    const struct stat file = PreparedFile();
+    Opened opened{Database(kDeviceStore), file.st_dev, file.st_ino};
+    try {
+      Prepare(opened.database);
+      return opened;
+    } catch (const DamagedDatabase &damage) {
+      if (again) {
+        throw;
+      }
+      ReplaceDamagedStore(opened.database, kTables, damage.what());
+    }
   }
-  if (schema() != kSchema) {
-    throw DatabaseError(std::string(kDeviceStore) + " is of another version");
+}
+
+bool DeviceStore::IsCurrent() const {
+  struct stat info {};
+  return lstat(kDeviceStore, &info) == 0 && info.st_dev == opened_.device && info.st_ino == opened_.node;
+}
+
+UniqueFd DeviceStore::TakeTurnForEdit() {
+  UniqueFd turn = TakeStoreTurn();
+  if (!IsCurrent()) {
+    opened_ = OpenInTurn();
   }
+  return turn;
 }
 
 std::vector<Device> DeviceStore::Devices() {
   std::vector<Device> devices;
   std::unordered_map<std::string, size_t> places;
-  Statement rows(database_,
-                 "SELECT mac, ip, netif, connection, manufacturer, sources, last_seen FROM device ORDER BY mac");
+  Statement rows(opened_.database, kReadDevices);
   while (rows.Step()) {
-    devices.push_back(DeviceOf(rows));
-    places[devices.back().mac] = devices.size() - 1;
+    if (IsDevices(rows) && AreClean(rows, {1, 2, 3, 4})) {
+      devices.push_back(DeviceOf(rows));
+      places[devices.back().mac] = devices.size() - 1;
+    }
   }
-  Statement findings(database_, "SELECT mac, source, name, type, model FROM finding");
+  Statement findings(opened_.database, kReadFindings);
   while (findings.Step()) {
     const auto place = places.find(findings.Text(0));
     const auto source = static_cast<size_t>(findings.Number(1));
-    if (place != places.end() && source < kSourceCount) {
+    if (place != places.end() && source < kSourceCount && AreClean(findings, {2, 3, 4})) {
       devices[place->second].findings[source] = {findings.Text(2), findings.Text(3), findings.Text(4)};
     }
   }
@@ -123,33 +203,36 @@ std::vector<Device> DeviceStore::Devices() {
 
 std::map<std::string, OwnerEntry> DeviceStore::OwnerEntries() {
   std::map<std::string, OwnerEntry> entries;
-  Statement rows(database_, "SELECT mac, name, type FROM owner");
+  Statement rows(opened_.database, kReadOwner);
   while (rows.Step()) {
-    entries[rows.Text(0)] = {rows.Text(1), rows.Text(2)};
+    if (IsDevices(rows) && AreClean(rows, {1, 2})) {
+      entries[rows.Text(0)] = {rows.Text(1), rows.Text(2)};
+    }
   }
   return entries;
 }
 
 void DeviceStore::Write(const std::vector<Device> &changed, const std::vector<std::string> &forgotten) {
-  database_.Execute("PRAGMA synchronous = NORMAL"); // what is lost with the power is found again
-  Transaction transaction(database_);
-  DeviceWriter writer(database_);
+  opened_.database.Execute("PRAGMA synchronous = NORMAL"); // what is lost with the power is found again
+  Transaction transaction(opened_.database);
+  DeviceWriter writer(opened_.database);
   for (const Device &device : changed) {
     writer.Write(device);
   }
   for (const std::string &mac : forgotten) {
-    Statement(database_, "DELETE FROM device WHERE mac = ?1").Bind(1, mac).Run();
-    Statement(database_, "DELETE FROM finding WHERE mac = ?1").Bind(1, mac).Run();
+    Statement(opened_.database, "DELETE FROM device WHERE mac = ?1").Bind(1, mac).Run();
+    Statement(opened_.database, "DELETE FROM finding WHERE mac = ?1").Bind(1, mac).Run();
   }
   transaction.Commit();
 }
 
 bool DeviceStore::SetOwner(const std::string &mac, const OwnerEntry &entry) {
-  database_.Execute("PRAGMA synchronous = FULL");
-  Transaction transaction(database_);
-  Statement write(database_, "INSERT OR REPLACE INTO owner VALUES (?1, ?2, ?3)");
+  const UniqueFd turn = TakeTurnForEdit();
+  opened_.database.Execute("PRAGMA synchronous = FULL");
+  Transaction transaction(opened_.database);
+  Statement write(opened_.database, "INSERT OR REPLACE INTO owner VALUES (?1, ?2, ?3)");
   write.Bind(1, mac).Bind(2, entry.name).Bind(3, entry.type).Run();
-  Statement count(database_, "SELECT count(*) FROM owner");
+  Statement count(opened_.database, "SELECT count(*) FROM owner");
   if (!count.Step() || count.Number(0) > static_cast<int64_t>(kDeviceLimit)) {
     return false;
   }
@@ -159,13 +242,14 @@ bool DeviceStore::SetOwner(const std::string &mac, const OwnerEntry &entry) {
 }
 
 bool DeviceStore::Forget(const std::string &mac) {
-  database_.Execute("PRAGMA synchronous = FULL");
-  Transaction transaction(database_);
+  const UniqueFd turn = TakeTurnForEdit();
+  opened_.database.Execute("PRAGMA synchronous = FULL");
+  Transaction transaction(opened_.database);
   int removed = 0;
   for (const char *sql : {"DELETE FROM device WHERE mac = ?1", "DELETE FROM finding WHERE mac = ?1",
                           "DELETE FROM owner WHERE mac = ?1"}) {
-    Statement(database_, sql).Bind(1, mac).Run();
-    removed += database_.Changes();
+    Statement(opened_.database, sql).Bind(1, mac).Run();
+    removed += opened_.database.Changes();
   }
   transaction.Commit();
   return removed > 0;

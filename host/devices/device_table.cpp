@@ -364,6 +364,13 @@ void DeviceTable::NoteUnwritten(const std::vector<Device> &changes) {
   }
 }
 
+void DeviceTable::NoteAllUnwritten() {
+  for (auto &[mac, record] : records_) {
+    record.written.reset();
+    record.writes = 0;
+  }
+}
+
 void DeviceTable::Erase(const std::string &mac) {
   const auto record = records_.find(mac);
   if (record == records_.end()) {

@@ -75,6 +75,8 @@ public:
 
   /// These could not be written after all.
   void NoteUnwritten(const std::vector<Device> &changes);
+  /// There is another store.
+  void NoteAllUnwritten();
 
   /// Forgets those written devices that are not in the store any more.
   void ForgetMissing(const std::set<std::string> &stored);

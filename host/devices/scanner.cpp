@@ -106,6 +106,8 @@ void Scanner::Run() {
       ticked_ = BootMillis();
       try {
         Tick();
+      } catch (const DamagedDatabase &) { // whoever opens it says so
+        storeDamaged_ = true;
       } catch (const std::exception &error) { // such as a full disk: the next tick tries again
         LogError("devices: %s", LogText(error.what()).c_str());
         ticked_ += kLookInterval;
@@ -237,8 +239,24 @@ void Scanner::FetchOneDescription() {
   table_.NoteFinding(Source::kUpnp, next.netif, next.ip, ParseDescription(content));
 }
 
-// The owner's edits come from other processes.
+// What was written is in another file now, which may be a new one.
+void Scanner::OpenStoreAnew() {
+  storeDamaged_ = false;
+  DeviceStore fresh;
+  if (store_.IsCurrent()) {
+    LogError("devices: the store fails, and yet there is nothing wrong with its form");
+  }
+  store_ = std::move(fresh);
+  storeVersion_ = store_.DataVersion();
+  owner_ = store_.OwnerEntries();
+  table_.NoteAllUnwritten();
+}
+
+// The owner's edits come from other processes, and so does a new store in the place of one that was damaged.
 void Scanner::FollowStore() {
+  if (storeDamaged_ || !store_.IsCurrent()) {
+    OpenStoreAnew();
+  }
   const int64_t version = store_.DataVersion();
   if (version == storeVersion_) {
     return;

@@ -44,6 +44,7 @@ private:
   void QueueDescription(const std::string &netif, uint32_t ip, const std::string &url);
   void FetchOneDescription();
   void FollowStore();
+  void OpenStoreAnew();
   void Write(bool isLast);
   std::string NetifOf(const std::string &ip) const;
 
@@ -62,6 +63,7 @@ private:
   PresenceMap presence_;                               // as written
   timespec leasesChanged_{};
   int64_t storeVersion_ = 0;
+  bool storeDamaged_ = false;
   bool neighboursStirred_ = true;
   bool linksStirred_ = true;
   // BootMillis of what was done last

@@ -26,6 +26,13 @@ void LogError(const char *format, ...) {
   va_end(arguments);
 }
 
+void LogWarning(const char *format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  Write(LOG_WARNING, format, arguments);
+  va_end(arguments);
+}
+
 void LogInfo(const char *format, ...) {
   va_list arguments;
   va_start(arguments, format);

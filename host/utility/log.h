@@ -10,6 +10,9 @@ namespace vornhost {
 /// One line of level LOG_ERR. What comes from outside goes in as LogText(...), never into the format.
 void LogError(const char *format, ...) __attribute__((format(printf, 1, 2)));
 
+/// One line of level LOG_WARNING: something was wrong, and the platform helped itself.
+void LogWarning(const char *format, ...) __attribute__((format(printf, 1, 2)));
+
 /// One line of level LOG_INFO.
 void LogInfo(const char *format, ...) __attribute__((format(printf, 1, 2)));
 

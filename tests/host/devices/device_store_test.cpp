@@ -99,14 +99,6 @@ TEST_F(DeviceStoreTest, ALinkInItsPlaceIsRefused) {
   EXPECT_EQ(result, Json::Value("as it was"));
 }
 
-TEST_F(DeviceStoreTest, AFileThatIsNoStoreIsRefusedAndStays) {
-  const std::string text = "no database, but a text that is long enough to be looked at as one";
-  hosttest::WriteText(vornhost::kDeviceStore, text);
-  EXPECT_THROW(DeviceStore(), vornhost::DatabaseError);
-  EXPECT_NE(Set(Edit(kMac, "name")), 0);
-  EXPECT_EQ(hosttest::ReadText(vornhost::kDeviceStore), text);
-}
-
 TEST_F(DeviceStoreTest, TimesFollowTheTimeZone) {
   DeviceStore().Write({Laptop()}, {});
   for (const auto &[zone, time] :

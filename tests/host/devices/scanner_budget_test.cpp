@@ -3,16 +3,15 @@
 #include "host/devices/device_store.h"
 #include "platform/netclient.h"
 #include "tests/host/devices/crowd.h"
+#include "tests/host/devices/scanner_process.h"
 #include "tests/host/files.h"
 #include "tests/host/network/shell.h"
 
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 
-#include <csignal>
 #include <ctime>
+#include <optional>
 #include <sstream>
-#include <unistd.h>
 
 namespace {
 
@@ -27,22 +26,9 @@ struct Cost {
 class ScannerBudget : public testing::Test {
 protected:
   void SetUp() override {
-    hosttest::Shell("ip link add lbr0 type bridge && ip link add lan1 type veth peer name far1 && "
-                    "sysctl -qw net.ipv6.conf.far1.disable_ipv6=1 net.ipv4.conf.far1.arp_ignore=8 "
-                    "net.ipv4.conf.lbr0.arp_accept=1 && ip link set lan1 master lbr0 && ip link set far1 up && "
-                    "ip link set lan1 up && ip addr add 192.168.0.1/16 dev lbr0 && ip link set lbr0 up");
+    hosttest::MakeCable();
     hosttest::FreshFolder("/var/lib/vorn");
-    scanner_ = fork();
-    if (scanner_ == 0) {
-      execl(VORN_DEVICES_PROGRAM, "vorndevices", "watch", nullptr);
-      _exit(127);
-    }
-  }
-  void TearDown() override {
-    kill(scanner_, SIGTERM);
-    int status = -1;
-    waitpid(scanner_, &status, 0);
-    EXPECT_EQ(status, 0);
+    scanner_.emplace();
   }
 
   static int Online() {
@@ -60,7 +46,7 @@ protected:
 
   // The scheduler's own count, in nanoseconds; clock ticks are too coarse for so little.
   double CpuSeconds() const {
-    std::istringstream fields(hosttest::ReadText("/proc/" + std::to_string(scanner_) + "/schedstat"));
+    std::istringstream fields(hosttest::ReadText("/proc/" + std::to_string(scanner_->Pid()) + "/schedstat"));
     double nanoseconds = -1;
     fields >> nanoseconds;
     EXPECT_GT(nanoseconds, 0);
@@ -85,7 +71,7 @@ protected:
     return cost;
   }
 
-  pid_t scanner_ = -1;
+  std::optional<hosttest::ScannerProcess> scanner_;
 };
 
 TEST_F(ScannerBudget, IsKeptAt50AndAt250Devices) {
