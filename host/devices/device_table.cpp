@@ -167,8 +167,23 @@ void DeviceTable::SetFinding(Record &record, Source source, const Finding &findi
   record.device.sources |= BitOf(source);
 }
 
+// An address of the link is no evidence, but it says that there may be somebody.
+void DeviceTable::NoteGuess(const DeviceNeighbour &neighbour, const Moment &now) {
+  Record *record = neighbour.guess.empty() ? nullptr : Get(neighbour.mac, now);
+  if (record == nullptr) {
+    return;
+  }
+  record->guess = neighbour.guess;
+  record->guessNetif = neighbour.netif;
+  record->stirred = record->stirred || neighbour.updatedAgo < kStirring;
+}
+
 void DeviceTable::NoteNeighbour(const DeviceNeighbour &neighbour, const Moment &now) {
-  Record *record = neighbour.linkLocal ? nullptr : Get(neighbour.mac, now);
+  if (neighbour.linkLocal) {
+    NoteGuess(neighbour, now);
+    return;
+  }
+  Record *record = Get(neighbour.mac, now);
   if (record == nullptr) {
     return;
   }
@@ -271,18 +286,32 @@ bool DeviceTable::IsProbeDue(const Record &record, int64_t now) {
   return sinceProbe >= (record.stirred ? kProbeAgain : kProbeGone);
 }
 
+// REQUIRES: an address is known, or guessed.
+Probe DeviceTable::NextProbe(const std::string &mac, Record &record, int64_t now) {
+  const std::string &known = record.device.ip;
+  if (known.empty() && record.addresses.empty()) {
+    return {mac, record.guessNetif, "", record.guess, false};
+  }
+  const int64_t age = record.seen ? now - *record.seen : INT64_MAX;
+  const bool isUrgent = age >= kBroadcastAfter;
+  Probe probe{mac, record.device.netif, record.candidate.empty() ? known : record.candidate, "", isUrgent};
+  if (!record.addresses.empty() && (known.empty() || isUrgent)) {
+    probe.address = record.addresses.front();
+    if (isUrgent) { // that one may be over, as temporary addresses are: another one the next time
+      std::rotate(record.addresses.begin(), record.addresses.begin() + 1, record.addresses.end());
+    }
+  }
+  return probe;
+}
+
 std::vector<Probe> DeviceTable::TakeProbes(const Moment &now) {
   std::vector<Probe> probes;
   for (auto &[mac, record] : records_) {
-    const bool hasAddress = !record.device.ip.empty() || !record.addresses.empty();
-    if (probes.size() == kProbesAtOnce || !hasAddress || record.device.netif.empty() || !IsProbeDue(record, now.boot)) {
+    const bool hasAddress = (!record.device.ip.empty() || !record.addresses.empty()) && !record.device.netif.empty();
+    if (probes.size() == kProbesAtOnce || (!hasAddress && record.guess.empty()) || !IsProbeDue(record, now.boot)) {
       continue;
     }
-    const int64_t age = record.seen ? now.boot - *record.seen : INT64_MAX;
-    const bool isUrgent = age >= kBroadcastAfter;
-    const bool byAddress = !record.addresses.empty() && (record.device.ip.empty() || isUrgent);
-    const std::string &ip = record.candidate.empty() ? record.device.ip : record.candidate;
-    probes.push_back({mac, record.device.netif, ip, byAddress ? record.addresses.front() : "", isUrgent});
+    probes.push_back(NextProbe(mac, record, now.boot));
     record.candidate.clear();
     record.probed = now.boot;
     record.stirred = false;
@@ -399,7 +428,9 @@ std::vector<std::string> DeviceTable::Shrink(const std::map<std::string, OwnerEn
   std::vector<std::pair<int64_t, std::string>> candidates; // by when they were last seen
   std::vector<std::string> doomed;
   for (const auto &[mac, record] : records_) {
-    if (record.device.sources == 0 && now.boot - record.created > kOnlineMillis) { // it never answered
+    // Who never answered; a guess has its time, or it would be made anew, and asked, every minute.
+    const int64_t patience = record.guess.empty() ? kOnlineMillis : kProbeGone - kProbeAgain;
+    if (record.device.sources == 0 && now.boot - record.created > patience) {
       doomed.push_back(mac);
     } else if (!owner.contains(mac)) {
       candidates.emplace_back(record.seen ? WallOf(*record.seen, now) : record.device.lastSeen, mac);

@@ -99,6 +99,8 @@ private:
     bool stirred = false;               // something came from it that is no evidence
     std::string candidate;              // IPv4: it seems to have moved there, and is asked
     std::vector<std::string> addresses; // IPv6, beside the link's own; the last one confirmed first
+    std::string guess;                  // IPv6: asked where nothing else is known
+    std::string guessNetif;
     std::optional<RadioFigures> radio;
     int inquiries = 0;
     int64_t nextInquiry = 0;
@@ -108,12 +110,14 @@ private:
   };
 
   Record *Get(const std::string &mac, const Moment &now);
+  void NoteGuess(const DeviceNeighbour &neighbour, const Moment &now);
   void See(Record &record, int64_t when);
   void Place(Record &record, const std::string &netif, const std::string &ip, int64_t when);
   void SetFinding(Record &record, Source source, const Finding &finding);
   void NoteStation(const WifiStation &station, const Moment &now);
   void Erase(const std::string &mac);
   static bool IsProbeDue(const Record &record, int64_t now);
+  static Probe NextProbe(const std::string &mac, Record &record, int64_t now);
   static bool MayWrite(Record &record, int64_t now);
 
   std::string ownName_;

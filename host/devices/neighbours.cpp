@@ -58,7 +58,20 @@ template <typename Visit> void ForEachAttribute(std::string_view bytes, const Vi
   }
 }
 
-void TakeAddress(std::string_view bytes, DeviceNeighbour &neighbour) {
+// The interface identifier is the second half (RFC 4291 section 2.5.1).
+std::string GuessOf(std::string_view linkLocal, const Bridge &bridge) {
+  const auto network = std::find_if(bridge.networks6.begin(), bridge.networks6.end(),
+                                    [](const auto &each) { return each.second == 64; });
+  if (network == bridge.networks6.end()) {
+    return "";
+  }
+  Ipv6Address guess = network->first;
+  std::memcpy(guess.data() + guess.size() / 2, linkLocal.data() + guess.size() / 2, guess.size() / 2);
+  std::array<char, INET6_ADDRSTRLEN> text{};
+  return inet_ntop(AF_INET6, guess.data(), text.data(), text.size());
+}
+
+void TakeAddress(std::string_view bytes, const Bridge &bridge, DeviceNeighbour &neighbour) {
   std::array<char, INET6_ADDRSTRLEN> text{};
   const size_t wanted = neighbour.family == AF_INET ? 4 : 16;
   if (bytes.size() == wanted && inet_ntop(neighbour.family, bytes.data(), text.data(), text.size()) != nullptr) {
@@ -67,6 +80,9 @@ void TakeAddress(std::string_view bytes, DeviceNeighbour &neighbour) {
     const auto second = static_cast<uint8_t>(bytes[1]);
     neighbour.linkLocal =
         neighbour.family == AF_INET ? first == 169 && second == 254 : first == 0xfe && (second & 0xc0U) == 0x80;
+    if (neighbour.family == AF_INET6 && neighbour.linkLocal) {
+      neighbour.guess = GuessOf(bytes, bridge);
+    }
   }
 }
 
@@ -98,7 +114,7 @@ void TakeNeighbour(std::string_view body, const std::vector<Bridge> &bridges,
   ForEachAttribute(body, [&](unsigned short type, std::string_view value) {
     nda_cacheinfo age{};
     if (type == NDA_DST) {
-      TakeAddress(value, neighbour);
+      TakeAddress(value, *bridge, neighbour);
     } else if (type == NDA_LLADDR) {
       TakeMac(value, neighbour);
     } else if (type == NDA_CACHEINFO && Take(value, age)) {
@@ -107,7 +123,8 @@ void TakeNeighbour(std::string_view body, const std::vector<Bridge> &bridges,
       hasAge = true;
     }
   });
-  if (hasAge && !neighbour.mac.empty() && !neighbour.address.empty()) {
+  const bool isOwn = neighbour.mac == bridge->mac; // the router hears its own advertisements
+  if (hasAge && !isOwn && !neighbour.mac.empty() && !neighbour.address.empty()) {
     neighbours.push_back(std::move(neighbour));
   }
 }
@@ -116,15 +133,26 @@ bool IsHomes(const Link &link) {
   return link.kind == "bridge" && link.up && link.name.find("br") != std::string::npos;
 }
 
-void AddNetwork(Bridge &bridge, const Address &address) {
-  const std::optional<uint32_t> ip = ParseIpv4(address.Host().c_str());
+// @return the whole address's length where there is none
+int PrefixOf(const Address &address, int whole) {
   const size_t slash = address.text.find('/');
-  int prefix = 32;
+  int prefix = whole;
   if (slash != std::string::npos) {
     std::from_chars(address.text.data() + slash + 1, address.text.data() + address.text.size(), prefix);
   }
-  if (ip) {
-    bridge.networks.emplace_back(*ip, prefix);
+  return prefix;
+}
+
+void AddNetwork(Bridge &bridge, const Address &address) {
+  Ipv6Address ip6{};
+  if (address.family == AF_INET6) {
+    if (!address.IsLinkLocal6() && inet_pton(AF_INET6, address.Host().c_str(), ip6.data()) == 1) {
+      bridge.networks6.emplace_back(ip6, PrefixOf(address, 128));
+    }
+    return;
+  }
+  if (const std::optional<uint32_t> ip = ParseIpv4(address.Host().c_str())) {
+    bridge.networks.emplace_back(*ip, PrefixOf(address, 32));
   }
 }
 
@@ -146,16 +174,26 @@ bool Bridge::Covers(uint32_t address) const {
   });
 }
 
+bool Bridge::Covers(const Ipv6Address &address) const {
+  return std::any_of(networks6.begin(), networks6.end(), [&address](const auto &network) {
+    const auto &[own, prefix] = network;
+    const auto whole = own.begin() + prefix / 8;
+    const unsigned rest = 0xffU & (0xff00U >> static_cast<unsigned>(prefix % 8));
+    return std::equal(own.begin(), whole, address.begin()) &&
+           (prefix == 128 || ((*whole ^ address[static_cast<size_t>(prefix / 8)]) & rest) == 0);
+  });
+}
+
 std::vector<Bridge> ReadBridges(Netlink &netlink) {
   std::vector<Bridge> bridges;
   for (const Link &link : netlink.Links()) {
     if (IsHomes(link)) {
-      bridges.push_back({link.index, link.name, link.mac, {}});
+      bridges.push_back({link.index, link.name, link.mac, {}, {}});
     }
   }
   for (const Address &address : netlink.Addresses()) {
     for (Bridge &bridge : bridges) {
-      if (bridge.index == address.index && address.family == AF_INET) {
+      if (bridge.index == address.index) {
         AddNetwork(bridge, address);
       }
     }
@@ -172,7 +210,8 @@ void ParseNeighbours(std::string_view messages, const std::vector<Bridge> &bridg
   });
 }
 
-NeighbourTable::NeighbourTable() : events_(OpenNetlink(RTMGRP_NEIGH | RTMGRP_LINK | RTMGRP_IPV4_IFADDR)) {}
+NeighbourTable::NeighbourTable()
+    : events_(OpenNetlink(RTMGRP_NEIGH | RTMGRP_LINK | RTMGRP_IPV4_IFADDR | RTMGRP_IPV6_IFADDR)) {}
 
 NeighbourTable::Changes NeighbourTable::TakeChanges() {
   Changes changes;

@@ -5,6 +5,7 @@
 #include "host/network/netlink.h"
 #include "host/utility/unique_fd.h"
 
+#include <array>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -12,14 +13,18 @@
 
 namespace vornhost {
 
+using Ipv6Address = std::array<uint8_t, 16>;
+
 /// A bridge that is up and whose name has "br" in it, as all of the platform's have.
 struct Bridge {
   int index = 0;
   std::string name;
   std::string mac;
   std::vector<std::pair<uint32_t, int>> networks; ///< its own IPv4 addresses in host order, each with its prefix length
+  std::vector<std::pair<Ipv6Address, int>> networks6; ///< the same for IPv6, without those of the link alone
 
   bool Covers(uint32_t address) const;
+  bool Covers(const Ipv6Address &address) const;
   bool operator==(const Bridge &) const = default;
 };
 
@@ -33,6 +38,9 @@ struct DeviceNeighbour {
   bool reachable = false;   ///< the kernel has had an answer (NUD_REACHABLE), and it has not grown old
   int64_t confirmedAgo = 0; ///< milliseconds since the last answer
   int64_t updatedAgo = 0;   ///< milliseconds since the entry changed its state
+  /// Beside an IPv6 address of the link: the one that the host would have in the bridge's network, if it made both of
+  /// the same interface identifier (RFC 4862 section 5.5.3). Many do; empty: the network has no such addresses.
+  std::string guess;
 };
 
 /// The home's bridges. Throws NetlinkError.

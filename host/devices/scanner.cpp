@@ -35,6 +35,8 @@ constexpr int64_t kStationInterval = 10000;
 constexpr int64_t kWriteInterval = 2000;
 constexpr int64_t kAskAllInterval = 300000;
 constexpr int64_t kAskNewInterval = 10000; // when there are new devices
+// Hosts that have just got a network need some seconds for their addresses.
+constexpr int64_t kAskNodesPauses[] = {0, 5000, 10000, 30000, kAskAllInterval};
 constexpr int64_t kDescriptionAge = 3600000;
 constexpr size_t kDescriptionLimit = 256;
 
@@ -139,6 +141,7 @@ void Scanner::Tick() {
   if (IsPast(stationsRead_, kStationInterval)) {
     LookAtStations();
   }
+  AskForQuietHosts();
   AskForPresence();
   AskForNames();
   FetchOneDescription();
@@ -152,7 +155,11 @@ void Scanner::Tick() {
 void Scanner::FollowBridges() {
   linksStirred_ = false;
   followed_ = BootMillis();
-  bridges_ = ReadBridges(netlink_);
+  std::vector<Bridge> bridges = ReadBridges(netlink_);
+  if (bridges != bridges_) {
+    nodeQuestions_ = 0;
+  }
+  bridges_ = std::move(bridges);
   names_.Follow(bridges_);
 }
 
@@ -204,6 +211,18 @@ void Scanner::AskForPresence() {
     if (bridge != bridges_.end()) {
       probes_.Send(probe, *bridge);
     }
+  }
+}
+
+void Scanner::AskForQuietHosts() {
+  const Moment now = Now();
+  for (const DeviceNeighbour &neighbour : allNodes_.Receive(bridges_, now.boot)) {
+    table_.NoteNeighbour(neighbour, now);
+  }
+  if (IsPast(askedNodes_, kAskNodesPauses[std::min(nodeQuestions_, std::size(kAskNodesPauses) - 1)])) {
+    askedNodes_ = now.boot;
+    ++nodeQuestions_;
+    allNodes_.Ask(bridges_, now.boot);
   }
 }
 

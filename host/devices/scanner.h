@@ -2,6 +2,7 @@
 #ifndef HOST_DEVICES_SCANNER_H
 #define HOST_DEVICES_SCANNER_H
 
+#include "host/devices/all_nodes.h"
 #include "host/devices/device_store.h"
 #include "host/devices/device_table.h"
 #include "host/devices/name_search.h"
@@ -40,6 +41,7 @@ private:
   void LookAtLeases();
   void LookAtStations();
   void AskForPresence();
+  void AskForQuietHosts();
   void AskForNames();
   void QueueDescription(const std::string &netif, uint32_t ip, const std::string &url);
   void FetchOneDescription();
@@ -54,6 +56,7 @@ private:
   Netlink netlink_;
   NeighbourTable neighbours_;
   ProbeSender probes_;
+  AllNodesEcho allNodes_;
   DeviceTable table_;
   NameSearch names_;
   std::vector<Bridge> bridges_;
@@ -64,6 +67,7 @@ private:
   timespec leasesChanged_{};
   int64_t storeVersion_ = 0;
   bool storeDamaged_ = false;
+  size_t nodeQuestions_ = 0;
   bool neighboursStirred_ = true;
   bool linksStirred_ = true;
   // BootMillis of what was done last
@@ -72,6 +76,7 @@ private:
   int64_t followed_ = 0;
   int64_t stationsRead_ = 0;
   int64_t askedAll_ = 0;
+  int64_t askedNodes_ = 0;
   int64_t wrote_ = 0;
 };
 

@@ -49,7 +49,7 @@ void CheckFiles(std::string_view content) {
 
 void CheckNeighbours(std::string_view messages) {
   std::vector<vornhost::DeviceNeighbour> neighbours;
-  vornhost::ParseNeighbours(messages, {{3, "lbr0", "", {}}}, neighbours);
+  vornhost::ParseNeighbours(messages, {{3, "lbr0", "", {}, {}}}, neighbours);
   for (const vornhost::DeviceNeighbour &neighbour : neighbours) {
     Demand(vornhost::ParseDeviceMac(neighbour.mac) == neighbour.mac && !neighbour.address.empty());
   }

@@ -6,7 +6,7 @@ use_home devices
 need "the home is up" home up
 
 readonly LAPTOP=d4:3d:7e:11:22:33 PRINTER=3c:2a:f4:11:22:44 CAMERA=00:40:8c:11:22:55 PLAYER=b0:a7:37:11:22:77
-readonly PHONE=f8:e4:3b:11:22:66
+readonly PHONE=f8:e4:3b:11:22:66 SENSOR=24:0a:c4:11:22:88
 
 vorndevices() { at router /usr/vorn/sbin/vorndevices "$@"; }
 entry() { # MAC TYPE: prints the device's entry, or nothing
@@ -21,11 +21,13 @@ state_of_device() { # MAC: online, "-", or nothing; as a person reads it
 is_online() { same online "$(state_of_device "$1")" 2>/dev/null; }
 is_gone() { same - "$(state_of_device "$1")" 2>/dev/null; }
 scanner_pid() { at router pidof vorndevices; }
-all_online() { same 5 "$(vorndevices list | grep -c '^online')" 2>/dev/null; }
+all_online() { same 6 "$(vorndevices list | grep -c '^online')" 2>/dev/null; }
 
 check "the bridges take an answer as news" same "1 1" \
   "$(at router sysctl -n net.ipv4.conf.lbr0.arp_accept net.ipv4.conf.gbr0.arp_accept | xargs)"
 check "all devices are there" eventually 20 all_online
+check "the sensor, which speaks IPv6 alone and says nothing, is in the LAN" says $SENSOR all netif lbr0
+check "it has no IPv4 address" says $SENSOR all ipAddr null
 check "the laptop has its NetBIOS name" eventually 60 says $LAPTOP netbios displayName LAPTOP-ANNA
 check "and its name by DHCP" says $LAPTOP dhcp displayName laptop
 check "of both, people see the first" says $LAPTOP all displayName LAPTOP-ANNA
@@ -101,12 +103,19 @@ pulled=$(now_ms)
 check "the printer is unplugged: it is gone within a minute" eventually 61 is_gone $PRINTER
 echo "after $(($(now_ms) - pulled)) ms"
 check "the others are there" stays_online $LAPTOP 5
+check "the sensor stays, though it says nothing by itself" is_online $SENSOR
 at router ip neigh replace 192.168.1.111 dev lbr0 lladdr $PRINTER nud stale
 check "a stale entry of the kernel's does not bring it back" not is_online $PRINTER
 check "the owner's name is there" says $PRINTER all userdef_displayName "Drucker <oben>"
 at printer ip link set eth0 up
 home plug printer
 check "plugged in again it is there" eventually 15 is_online $PRINTER
+
+at sensor ip link set eth0 down
+check "the sensor is unplugged: it is gone within a minute" eventually 61 is_gone $SENSOR
+at sensor sysctl -qw net.ipv6.icmp.echo_ignore_all=1 net.ipv6.conf.eth0.addr_gen_mode=0
+at sensor ip link set eth0 up
+check "plugged in again it is there, and answers no echo" eventually 20 is_online $SENSOR
 
 # ---- an address that moves, a device that is forgotten
 take_address() { # the camera takes the laptop's

@@ -166,6 +166,66 @@ TEST_F(DeviceTableTest, AHostOfIpv6AloneIsAskedByItsAddress) {
   EXPECT_EQ(Written(kLaptop).netif, "lbr0");
 }
 
+TEST_F(DeviceTableTest, AHostOfIpv6AloneThatIsSilentIsAskedByEveryAddressInTurn) {
+  See(kLaptop, "2001:db8::1");
+  See(kLaptop, "2001:db8::2");
+  std::set<std::string> asked;
+  for (int second = 0; second < 60; ++second) {
+    Pass(1);
+    for (const vornhost::Probe &probe : table_.TakeProbes(Now())) {
+      asked.insert(probe.address);
+    }
+  }
+  EXPECT_THAT(asked, ElementsAre("2001:db8::1", "2001:db8::2"));
+}
+
+TEST_F(DeviceTableTest, WhoIsKnownByTheLinkAloneIsAskedByAGuessAndIsNotThereYet) {
+  DeviceNeighbour neighbour = Entry(kLaptop, "fe80::7");
+  neighbour.guess = "2001:db8::7";
+  table_.NoteNeighbour(neighbour, Now());
+  const auto probes = table_.TakeProbes(Now());
+  ASSERT_THAT(probes, SizeIs(1));
+  EXPECT_EQ(probes[0].address, "2001:db8::7");
+  EXPECT_EQ(probes[0].netif, "lbr0");
+  EXPECT_EQ(probes[0].ip, "");
+  EXPECT_FALSE(IsOnline(kLaptop));
+  EXPECT_THAT(table_.TakeChanges(Now()), IsEmpty());
+  See(kLaptop, "2001:db8::7");
+  EXPECT_TRUE(IsOnline(kLaptop));
+  EXPECT_EQ(Written(kLaptop).netif, "lbr0");
+}
+
+TEST_F(DeviceTableTest, AWrongGuessIsAskedEveryFiveMinutes) {
+  DeviceNeighbour neighbour = Entry(kLaptop, "fe80::7", false);
+  neighbour.guess = "2001:db8::7";
+  neighbour.updatedAgo = 3600000;
+  size_t asked = 0;
+  for (int second = 0; second < 3600; ++second) {
+    table_.NoteNeighbour(neighbour, Now());
+    asked += table_.TakeProbes(Now()).size();
+    EXPECT_THAT(table_.Shrink({}, Now()), IsEmpty());
+    Pass(1);
+  }
+  EXPECT_GE(asked, 11U);
+  EXPECT_LE(asked, 13U);
+  EXPECT_FALSE(IsOnline(kLaptop));
+}
+
+TEST_F(DeviceTableTest, WhoHasAnAddressIsNotAskedByAGuess) {
+  DeviceNeighbour neighbour = Entry(kLaptop, "fe80::7");
+  neighbour.guess = "2001:db8::7";
+  table_.NoteNeighbour(neighbour, Now());
+  See(kLaptop, "192.168.1.110");
+  for (int second = 0; second < 120; ++second) {
+    Pass(1);
+    table_.NoteNeighbour(neighbour, Now());
+    for (const vornhost::Probe &probe : table_.TakeProbes(Now())) {
+      EXPECT_EQ(probe.address, "");
+      EXPECT_EQ(probe.ip, "192.168.1.110");
+    }
+  }
+}
+
 TEST_F(DeviceTableTest, ProbesGoOutInSmallPortions) {
   for (int i = 0; i < 200; ++i) {
     char mac[18];

@@ -1,6 +1,7 @@
 // What devices say of themselves on the wire.
 #include "tests/host/devices/packets.h"
 
+#include "host/devices/all_nodes.h"
 #include "host/devices/dns_message.h"
 #include "host/devices/neighbours.h"
 #include "host/devices/node_status.h"
@@ -213,7 +214,7 @@ const std::string kLink6 = std::string("\xfe\x80", 2) + std::string(13, '\0') + 
 
 std::vector<vornhost::DeviceNeighbour> Parse(const std::string &messages) {
   std::vector<vornhost::DeviceNeighbour> out;
-  vornhost::ParseNeighbours(messages, {{3, "lbr0", "", {}}}, out);
+  vornhost::ParseNeighbours(messages, {{3, "lbr0", "", {}, {}}}, out);
   return out;
 }
 
@@ -248,6 +249,62 @@ TEST(Neighbours, EveryCutIsSurvived) {
   const std::string whole = NeighbourMessage(AF_INET, NUD_REACHABLE, 3, "\xc0\xa8\x01\x6e", kMac);
   for (size_t size = 0; size < whole.size(); ++size) {
     EXPECT_THAT(Parse(whole.substr(0, size)), IsEmpty()) << size;
+  }
+}
+
+// The bridge has 2001:db8:2::1/64.
+vornhost::Bridge LanBridge(int prefix = 64) {
+  return {3, "lbr0", "", {}, {{{0x20, 0x01, 0x0d, 0xb8, 0, 2, 0, 0, 0, 0, 0, 0, 0, 0, 0, 1}, prefix}}};
+}
+
+std::vector<vornhost::DeviceNeighbour> ParseOn(const vornhost::Bridge &bridge, const std::string &messages) {
+  std::vector<vornhost::DeviceNeighbour> out;
+  vornhost::ParseNeighbours(messages, {bridge}, out);
+  return out;
+}
+
+TEST(Neighbours, AnAddressOfTheLinkLeadsToOneOfTheHome) {
+  const std::string link = std::string("\xfe\x80", 2) + std::string(6, '\0') + "\x02\x11\x22\xff\xfe\x33\x44\x55";
+  const std::string message = NeighbourMessage(AF_INET6, NUD_STALE, 3, link, kMac);
+  EXPECT_EQ(ParseOn(LanBridge(), message)[0].guess, "2001:db8:2:0:211:22ff:fe33:4455");
+  EXPECT_EQ(ParseOn(LanBridge(56), message)[0].guess, "");
+  EXPECT_EQ(Parse(message)[0].guess, "");
+  EXPECT_EQ(ParseOn(LanBridge(), NeighbourMessage(AF_INET6, NUD_STALE, 3, kGlobal6, kMac))[0].guess, "");
+}
+
+TEST(Neighbours, TheRouterItselfIsNone) {
+  vornhost::Bridge bridge = LanBridge();
+  bridge.mac = "d4:3d:7e:11:22:33";
+  EXPECT_THAT(ParseOn(bridge, NeighbourMessage(AF_INET6, NUD_STALE, 3, kLink6, kMac)), IsEmpty());
+}
+
+// ---- answers to an echo request
+
+std::string EchoReply(const std::string &source, unsigned id, char type = '\x81', char next = 58) {
+  return std::string("\x60\0\0\0\0\x08", 6) + next + '\x40' + source + kGlobal6 + type + std::string(3, '\0') +
+         Number(id) + Number(0);
+}
+
+const std::string kSensor = std::string("\x20\x01\x0d\xb8\0\x02", 6) + std::string(9, '\0') + "\x07";
+
+TEST(EchoAnswers, TheSenderIsTaken) {
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kSensor, 77), 77, LanBridge()), "2001:db8:2::7");
+}
+
+TEST(EchoAnswers, OfAnotherNetworkOrOfTheLinkAreNone) {
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kGlobal6, 77), 77, LanBridge()), "");
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kGlobal6, 77), 77, LanBridge(40)), "2001:db8::1");
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kSensor, 77), 77, LanBridge(128)), "");
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kLink6, 77), 77, LanBridge()), "");
+}
+
+TEST(EchoAnswers, ToNobodysQuestionOrOfAnotherKindAreNone) {
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kSensor, 78), 77, LanBridge()), "");
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kSensor, 77, '\x80'), 77, LanBridge()), "");
+  EXPECT_EQ(vornhost::EchoSender(EchoReply(kSensor, 77, '\x81', 17), 77, LanBridge()), "");
+  const std::string whole = EchoReply(kSensor, 77);
+  for (size_t size = 0; size < whole.size(); ++size) {
+    EXPECT_EQ(vornhost::EchoSender(whole.substr(0, size), 77, LanBridge()), "") << size;
   }
 }
 

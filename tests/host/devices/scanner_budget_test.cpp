@@ -27,6 +27,7 @@ class ScannerBudget : public testing::Test {
 protected:
   void SetUp() override {
     hosttest::MakeCable();
+    hosttest::Shell("ip addr add 2001:db8:2::1/64 dev lbr0 nodad"); // or nobody of IPv6 alone would be looked for
     hosttest::FreshFolder("/var/lib/vorn");
     scanner_.emplace();
   }
