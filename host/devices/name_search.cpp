@@ -4,6 +4,7 @@
 #include "host/devices/node_status.h"
 #include "host/devices/ssdp.h"
 #include "host/network/ipv4.h"
+#include "host/network/names.h"
 #include "host/utility/log.h"
 
 #include <arpa/inet.h>
@@ -107,9 +108,19 @@ void NameSearch::AskAll() const {
   const std::string services = ServiceQuestion();
   const std::string search = SearchMessage();
   for (const Ears &ears : ears_) {
+    if (ears.IsGuests()) {
+      continue;
+    }
     SendTo(ears.ask, services, kDnsGroup, kDnsPort);
     SendTo(ears.ask, search, kSsdpGroup, kSsdpPort);
   }
+}
+
+// Each by itself, and by unicast (RFC 6762 section 5.5): the firewall lets in what answers that, and nothing that
+// guests say unasked. No guest is told another one's address.
+void NameSearch::AskGuest(const Ears &ears, uint32_t ip) {
+  SendTo(ears.ask, ReverseQuestion({ip}), ip, kDnsPort);
+  SendTo(ears.ask, ServiceQuestion(), ip, kDnsPort);
 }
 
 void NameSearch::Ask(const std::vector<Inquiry> &inquiries) const {
@@ -117,15 +128,24 @@ void NameSearch::Ask(const std::vector<Inquiry> &inquiries) const {
   for (const Ears &ears : ears_) {
     std::vector<uint32_t> addresses;
     for (const Inquiry &inquiry : inquiries) {
-      if (inquiry.netif == ears.bridge.name && ears.bridge.Covers(inquiry.ip)) {
+      if (inquiry.netif != ears.bridge.name || !ears.bridge.Covers(inquiry.ip)) {
+        continue;
+      }
+      SendTo(ears.ask, status, inquiry.ip, kNetbiosPort);
+      if (ears.IsGuests()) {
+        AskGuest(ears, inquiry.ip);
+      } else {
         addresses.push_back(inquiry.ip);
-        SendTo(ears.ask, status, inquiry.ip, kNetbiosPort);
       }
     }
     if (!addresses.empty()) {
       SendTo(ears.ask, ReverseQuestion(addresses), kDnsGroup, kDnsPort);
     }
   }
+}
+
+bool NameSearch::Ears::IsGuests() const {
+  return bridge.name == kGuestBridge;
 }
 
 std::vector<int> NameSearch::Fds() const {

@@ -28,9 +28,9 @@ public:
   /// Opens and closes sockets so that each bridge that has an address has its own.
   void Follow(const std::vector<Bridge> &bridges);
 
-  /// Asks everybody on every bridge: services by multicast DNS, root devices by SSDP.
+  /// Asks everybody on every bridge but the guests': services by multicast DNS, root devices by SSDP.
   void AskAll() const;
-  /// Asks these for their names: NetBIOS, and multicast DNS by address.
+  /// Asks these for their names: NetBIOS, and multicast DNS by address; guests for their services as well.
   void Ask(const std::vector<Inquiry> &inquiries) const;
 
   /// The sockets, for poll(2).
@@ -44,9 +44,12 @@ private:
     UniqueFd ask;      // whence questions go, and where their answers come to
     UniqueFd dns;      // announcements by multicast DNS
     UniqueFd announce; // announcements by SSDP
+
+    bool IsGuests() const;
   };
 
   static Ears Open(const Bridge &bridge);
+  static void AskGuest(const Ears &ears, uint32_t ip);
   void ReceiveFrom(const Ears &ears, const UniqueFd &fd) const;
   void Take(const Ears &ears, bool isAnswer, std::string_view message, uint32_t ip, uint16_t port) const;
 

@@ -40,6 +40,7 @@ check "the player tells its name" eventually 60 says $PLAYER upnp displayName "L
 check "and its kind" says $PLAYER upnp deviceType "Media Server"
 check "the phone is a guest" says $PHONE all netif gbr0
 check "the phone has its name by DHCP" says $PHONE all displayName phone
+check "asked by multicast DNS it says its model" eventually 60 says $PHONE mdns modelName "Lumen 7"
 check "the printer is nothing that NetBIOS knows" same "" "$(entry $PRINTER netbios)"
 check "the store is root's alone" same "700 600" "$(at router stat -c %a /var/lib/vorn /var/lib/vorn/devices.db | xargs)"
 
