@@ -63,6 +63,17 @@ check "the owner's name is there" says $PRINTER all userdef_displayName "Drucker
 check "and the type" says $PRINTER all userdef_deviceType nas
 check "beside what the device says itself" says $PRINTER all displayName BRW3C2AF4112244
 
+# ---- a damaged store
+damage_store() { # while the scanner and whoever reads have it open
+  at router sh -c 'dd if=/dev/urandom of=/var/lib/vorn/rubbish bs=4096 count=3 2>/dev/null &&
+    mv /var/lib/vorn/rubbish /var/lib/vorn/devices.db && sha256sum </var/lib/vorn/devices.db'
+}
+rubbish=$(damage_store)
+check "the store is damaged: all devices are there again" eventually 10 all_online
+check "the damaged one is kept" same "$rubbish" "$(at router sh -c 'sha256sum </var/lib/vorn/devices.db.damaged')"
+check "and the log says so, once" same 1 "$(log_lines "the device store was damaged")"
+need "the owner names the printer again" vorndevices name $PRINTER "Drucker <oben>" nas
+
 # ---- names that are none, and bad ones
 rename_laptop() { # NAME: the laptop asks for its address under another name
   at laptop udhcpc -i eth0 -n -q -f -t 5 -T 1 -x "hostname:$1" >/dev/null 2>&1
