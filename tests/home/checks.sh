@@ -61,9 +61,9 @@ need() { # DESCRIPTION COMMAND...
   fi
 }
 
-# A sanitizer's report, of a build that has them.
+# A sanitizer's report, of a build that has them: of the server, of the router's other programs, of those that they run.
 no_sanitizer_report() {
-  ! grep -E 'Sanitizer|runtime error' "$state"/log/{server,syslog} 2>/dev/null
+  ! grep -E 'Sanitizer|runtime error' "$state"/log/* 2>/dev/null
 }
 
 # REQUIRES: the home is up.
