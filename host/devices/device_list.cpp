@@ -179,20 +179,24 @@ struct Ingredients {
 };
 
 // By the difference of the two clocks, a list says when a device was seen: it holds until one of them is set. That they
-// are read one after the other moves the difference a little.
+// are read one after the other moves the difference a little, so it is kept as it was first read: a sight has the same
+// time in every list.
 class ListKeeper {
 public:
   std::shared_ptr<const Json::Value> Get(unsigned sources, const Ingredients &of) {
-    const Moment now{WallMillis() / 1000, BootMillis()};
-    const int64_t bootedAt = WallMillis() - now.boot;
+    const int64_t wall = WallMillis();
+    const int64_t bootedAt = wall - BootMillis();
     const std::lock_guard lock(mutex_);
-    if (of != of_ || std::abs(bootedAt - bootedAt_) > kClockTolerance) {
+    const bool isSet = std::abs(bootedAt - bootedAt_) > kClockTolerance;
+    if (isSet || of != of_) {
       lists_.clear();
       of_ = of;
-      bootedAt_ = bootedAt;
+      bootedAt_ = isSet ? bootedAt : bootedAt_;
     }
     std::shared_ptr<const Json::Value> &list = lists_[sources];
     if (!list) {
+      const int64_t second = wall / 1000;
+      const Moment now{second, second * 1000 - bootedAt_};
       list = std::make_shared<const Json::Value>(RenderDevices(*of.stored, *of.presence, sources, now));
     }
     return list;

@@ -9,6 +9,7 @@
 #include <sys/wait.h>
 
 #include <csignal>
+#include <set>
 #include <thread>
 #include <unistd.h>
 
@@ -218,9 +219,19 @@ TEST_F(DeviceStoreTest, PresenceComesFromMemory) {
   EXPECT_FALSE(List()[0].isMember("signalstrength"));
 }
 
-// ---- death in the middle
+// The two clocks that it is told by do not turn their seconds together.
+TEST_F(DeviceStoreTest, ASightHasOneTimeWheneverItIsListed) {
+  DeviceStore().Write({Laptop()}, {});
+  const int64_t seen = vornhost::BootMillis() - 30000;
+  std::set<std::string> times;
+  for (int i = 0; i < 24; ++i) {
+    ASSERT_TRUE(vornhost::WritePresence({{kMac, {seen, {}}}, {"d4:3d:7e:00:00:01", {seen + i, {}}}}));
+    times.insert(List()[0]["asso_time"].asString());
+    usleep(50000);
+  }
+  EXPECT_THAT(times, SizeIs(1));
+}
 
-// A process that writes names one after the other, and says which are stored; it is killed at some moment.
 TEST_F(DeviceStoreTest, ANewSightShowsInTheNextList) {
   DeviceStore().Write({Laptop()}, {});
   const int64_t now = vornhost::BootMillis();
@@ -255,6 +266,9 @@ TEST_F(DeviceStoreTest, TheTimeZoneOfTheListIsTheOneThatIsSetNow) {
   EXPECT_NE(hourIn("Etc/GMT-3"), hourIn("Etc/GMT+4"));
 }
 
+// ---- death in the middle
+
+// A process that writes names one after the other, and says which are stored; it is killed at some moment.
 TEST_F(DeviceStoreTest, WhateverWasStoredSurvivesAKill) {
   int last = 0;
   for (int round = 0; round < 20; ++round) {
