@@ -1,5 +1,6 @@
 #!/usr/bin/python3
-"""http_bench.py BUILD_FOLDER [ROUNDS]: the server with the router's module against nginx and against a constant answer.
+"""http_bench.py BUILD_FOLDER [ROUNDS]: the server with the router's module against nginx and against a constant answer,
+with a token in clear, and with a session (cookie and CSRF token) over TLS.
 
 Runs under private_view: server, yardstick and load generator share one network namespace with nothing else in it. Targets are
 measured in turn, round after round, so that what disturbs the machine disturbs them alike; the medians are compared.
@@ -14,7 +15,8 @@ import tempfile
 import threading
 import time
 
-from served import CONNECTIONS, SECONDS, load, post, refuse_elsewhere, run, start_server, stop, wait_for
+from served import (CONNECTIONS, SECONDS, cpu_seconds, enter, load, post, refuse_elsewhere, run, start_server, stop,
+                    wait_for)
 
 BUILD = os.path.abspath(sys.argv[1]) if len(sys.argv) > 1 else ""
 ROUNDS = int(sys.argv[2]) if len(sys.argv) > 2 else 5
@@ -24,6 +26,9 @@ CONSTANT = "/webapi/VORN.Bench.Constant/1/get"
 LIMITS = {  # what the figures are held against
     "share of nginx's requests at 64 connections": 0.3,
     "times nginx's p99 at 64 connections": 3.0,
+    "TLS: share of nginx's requests at 64 connections": 0.2,
+    "TLS: times nginx's p99 at 64 connections": 3.0,
+    "TLS, session: times the processor time in clear": 1.5,
     "idle private memory, MB": 10.0,
     "start to first answer, ms": 100.0,
     "router.so stripped, kB": 300.0,
@@ -45,7 +50,8 @@ def make_home():
             file.write(text)
 
 
-def start_nginx(port, body, folder):
+def start_nginx(port, secure_port, body, folder, state):
+    """The answer as a file, in clear and over TLS with the server's own key."""
     os.makedirs(f"{folder}/root", exist_ok=True)
     with open(f"{folder}/root/answer.json", "wb") as file:
         file.write(body)
@@ -55,7 +61,9 @@ events {{ worker_connections 1024; }}
 http {{ access_log off; keepalive_requests 1000000000; default_type application/json; sendfile on; tcp_nodelay on;
   client_body_temp_path {folder}/b; proxy_temp_path {folder}/p; fastcgi_temp_path {folder}/f; uwsgi_temp_path {folder}/u;
   scgi_temp_path {folder}/s; open_file_cache max=10;
-  server {{ listen 127.0.0.1:{port}; root {folder}/root; }} }}
+  server {{ listen 127.0.0.1:{port}; root {folder}/root; }}
+  server {{ listen 127.0.0.1:{secure_port} ssl; root {folder}/root; ssl_certificate {state}/tls.crt;
+    ssl_certificate_key {state}/tls.key; ssl_protocols TLSv1.2 TLSv1.3; ssl_session_tickets off; }} }}
 """)
     yardstick = subprocess.Popen(["/usr/sbin/nginx", "-c", f"{folder}/nginx.conf", "-e", f"{folder}/error.log"])
     wait_for(port)
@@ -100,21 +108,38 @@ def stripped_size():
         return os.path.getsize(out.name) / 1000
 
 
+def cpu_of(process):
+    """Of a process and its children: nginx works in those."""
+    pids = [process.pid]
+    with open(f"/proc/{process.pid}/task/{process.pid}/children", encoding="ascii") as file:
+        pids += [int(pid) for pid in file.read().split()]
+    return sum(cpu_seconds(pid) for pid in pids)
+
+
+def measure_one(target, connections):
+    """Requests a second, p99 and processor time of the server a request, the times in microseconds."""
+    process, port, method, path, *way = target
+    before = cpu_of(process)
+    rate, p99, requests = load(port, method, path, connections, "", *way)
+    return rate, p99, (cpu_of(process) - before) / requests * 1e6
+
+
 def measure(targets):
     results = {(name, c): [] for name in targets for c in CONNECTIONS}
-    for name, (port, method, path) in targets.items():
-        load(port, method, path, 8)  # warm
+    for target in targets.values():
+        measure_one(target, 8)  # warm
     for _ in range(ROUNDS):
         for connections in CONNECTIONS:
-            for name, (port, method, path) in targets.items():
-                results[name, connections].append(load(port, method, path, connections))
-    return {key: (statistics.median(row[0] for row in rows), statistics.median(row[1] for row in rows))
-            for key, rows in results.items()}
+            for name, target in targets.items():
+                results[name, connections].append(measure_one(target, connections))
+    return {key: tuple(map(statistics.median, zip(*rows))) for key, rows in results.items()}
 
 
 def main():
     make_home()
     with tempfile.TemporaryDirectory() as folder:
+        state = f"{folder}/state"
+        os.mkdir(state, 0o700)
         figures = {"start to first answer, ms": first_answer(), "router.so stripped, kB": stripped_size()}
         server = start_server(BUILD, 8081, f"{BUILD}/router/router.so")
         answer = post(8081, TOPOLOGY)
@@ -122,32 +147,47 @@ def main():
             raise SystemExit(f"unexpected answer: {answer}")
         figures["idle private memory, MB"] = private_megabytes(server.pid)
         constant = start_server(BUILD, 8082, f"{BUILD}/bench/bench_constant.so")
-        nginx = start_nginx(8083, answer, folder)
-        medians = measure({"nginx, static file": (8083, "GET", "/answer.json"),
-                           "vornwebd, constant": (8082, "POST", CONSTANT),
-                           "vornwebd, Topology v2 get": (8081, "POST", TOPOLOGY)})
+        secure = start_server(BUILD, 8084, f"{BUILD}/router/router.so", state, "--tls", "yes")
+        session = enter(8084, state)
+        nginx = start_nginx(8083, 8085, answer, folder, state)
+        medians = measure({"nginx, static file": (nginx, 8083, "GET", "/answer.json"),
+                           "vornwebd, constant": (constant, 8082, "POST", CONSTANT),
+                           "vornwebd, Topology v2 get": (server, 8081, "POST", TOPOLOGY),
+                           "TLS: nginx, static file": (nginx, 8085, "GET", "/answer.json", "https"),
+                           "TLS, session: vornwebd": (secure, 8084, "POST", TOPOLOGY, "https", session)})
         cores = cores_used(server)
-        stop(server, constant, nginx)
+        stop(server, constant, secure, nginx)
     report(answer, medians, cores, figures)
 
 
+def held_against(medians, figures):
+    """Adds the figures that are ratios."""
+    for before, ours, theirs in (("", "vornwebd, Topology v2 get", "nginx, static file"),
+                                 ("TLS: ", "TLS, session: vornwebd", "TLS: nginx, static file")):
+        (rate, p99, _), (their_rate, their_p99, _) = medians[ours, 64], medians[theirs, 64]
+        figures[f"{before}share of nginx's requests at 64 connections"] = rate / their_rate
+        figures[f"{before}times nginx's p99 at 64 connections"] = p99 / their_p99
+    figures["TLS, session: times the processor time in clear"] = (medians["TLS, session: vornwebd", 64][2]
+                                                                  / medians["vornwebd, Topology v2 get", 64][2])
+
+
 def report(answer, medians, cores, figures):
-    print(f"answer of {len(answer)} bytes, medians of {ROUNDS} rounds of {SECONDS} s taken in turn, {os.cpu_count()} cores\n")
-    print(f"{'':28}" + "".join(f"{c:>10} conn. req/s, p99" for c in CONNECTIONS))
+    print(f"answer of {len(answer)} bytes, medians of {ROUNDS} rounds of {SECONDS} s taken in turn, {os.cpu_count()} cores, "
+          f"load {os.getloadavg()[0]:.1f}\n")
+    print(f"{'':28}" + "".join(f"{c:>9} conn. req/s, p99, CPU" for c in CONNECTIONS))
     for name in dict.fromkeys(n for n, _ in medians):
-        print(f"{name:28}" + "".join(f"{medians[name, c][0]:>16.0f} {medians[name, c][1]:>8.0f} us" for c in CONNECTIONS))
-    ours, theirs = medians["vornwebd, Topology v2 get", 64], medians["nginx, static file", 64]
-    figures["share of nginx's requests at 64 connections"] = ours[0] / theirs[0]
-    figures["times nginx's p99 at 64 connections"] = ours[1] / theirs[1]
+        print(f"{name:28}" + "".join("{:>14.0f} {:>6.0f} us {:>5.0f} us".format(*medians[name, c]) for c in CONNECTIONS))
+    held_against(medians, figures)
     print()
     failed = False
     for name, limit in LIMITS.items():
-        wanted = figures[name] >= limit if name.startswith("share") else figures[name] <= limit
+        at_least = "share" in name
+        wanted = figures[name] >= limit if at_least else figures[name] <= limit
         failed = failed or not wanted
-        print(f"{name:48}{figures[name]:>10.2f}   {'at least' if name.startswith('share') else 'at most'} {limit:g}"
+        print(f"{name:50}{figures[name]:>8.2f}   {'at least' if at_least else 'at most'} {limit:g}"
               f"   {'kept' if wanted else 'MISSED'}")
     both = len(cores) >= min(2, os.cpu_count())
-    print(f"{'cores seen serving 8 connections (samples)':48}{str(cores):>10}   {'kept' if both else 'MISSED'}")
+    print(f"{'cores seen serving 8 connections (samples)':50}{str(cores):>8}   {'kept' if both else 'MISSED'}")
     sys.exit(1 if failed or not both else 0)
 
 

@@ -1,7 +1,9 @@
 """What the benchmarks over HTTP share: the server started, and load put on it. Only inside private_view."""
+import json
 import os
 import re
 import socket
+import ssl
 import subprocess
 import sys
 import tempfile
@@ -32,11 +34,29 @@ def wait_for(port):
     raise SystemExit(f"nothing listens on port {port}")
 
 
+def _exchange(url, body, fields):
+    request = urllib.request.Request(url, data=body, method="POST", headers={"Content-Type": "application/json", **fields})
+    # Its own certificate, in a network with nothing else in it: nobody to be told apart.
+    return urllib.request.urlopen(request, timeout=5, context=ssl._create_unverified_context())
+
+
 def post(port, path, body=b""):
-    headers = {"Content-Type": "application/json", **_headers}
-    request = urllib.request.Request(f"http://127.0.0.1:{port}{path}", data=body, method="POST", headers=headers)
-    with urllib.request.urlopen(request, timeout=5) as answer:
+    with _exchange(f"http://127.0.0.1:{port}{path}", body, _headers) as answer:
         return answer.read()
+
+
+def enter(port, state):
+    """Over TLS: chooses a password and logs in with it. @return the fields that every call of the session has"""
+    def call(name, body, fields):
+        with _exchange(f"https://127.0.0.1:{port}/webapi/{name}", json.dumps(body).encode(), fields) as answer:
+            cookie = answer.headers.get("Set-Cookie", "").split(";")[0]
+            return {"Cookie": cookie, "X-CSRF-Token": json.loads(answer.read())["data"].get("csrf")}
+
+    with open(f"{state}/first-password", encoding="ascii") as file:
+        first = file.read().strip()
+    fields = call("login", {"user": "admin", "password": first}, {})
+    call("password", {"old": first, "new": "correct horse"}, fields)
+    return call("login", {"user": "admin", "password": "correct horse"}, {})
 
 
 def _make_token(build):
@@ -46,12 +66,14 @@ def _make_token(build):
         check=True, capture_output=True, text=True).stdout.strip()
 
 
-def start_server(build, port, module):
+def start_server(build, port, module, state=None, *options):
+    """With a state folder of its own where it is given one; else with the one whose token every call has."""
     if not _headers:
         _make_token(build)
     server = subprocess.Popen([f"{build}/webapi/vornwebd", "--module", module, "--state",
-                               os.environ["VORN_BENCH_STATE"], "--listen", f"127.0.0.1:{port}",
-                               "--connections-per-address", "1024"])  # those of the last run may still be there
+                               state or os.environ["VORN_BENCH_STATE"], "--listen", f"127.0.0.1:{port}",
+                               "--connections-per-address", "1024",  # those of the last run may still be there
+                               *options])
     wait_for(port)
     return server
 
@@ -62,9 +84,11 @@ def stop(*processes):
         process.wait()
 
 
-def load(port, method, path, connections, body=""):
-    """One run of wrk: requests per second, p99 in microseconds, and how many requests were answered."""
-    fields = "".join(f'wrk.headers["{name}"]="{value}"\n' for name, value in _headers.items())
+def load(port, method, path, connections, body="", scheme="http", session=None):
+    """One run of wrk: requests per second, p99 in microseconds, and how many requests were answered.
+
+    Calls have the fields of the session, or the token."""
+    fields = "".join(f'wrk.headers["{name}"]="{value}"\n' for name, value in (session or _headers).items())
     if body:
         fields += f'wrk.headers["Content-Type"]="application/json"\nwrk.body=[[{body}]]\n'
     script = f"""wrk.method="{method}"
@@ -78,7 +102,7 @@ end
         lua.write(script)
         lua.flush()
         out = subprocess.run(["wrk", "-t1", f"-c{connections}", f"-d{SECONDS}s", "--timeout", "30s", "-s", lua.name,
-                              f"http://127.0.0.1:{port}{path}"], check=True, capture_output=True, text=True).stdout
+                              f"{scheme}://127.0.0.1:{port}{path}"], check=True, capture_output=True, text=True).stdout
     rate, p99, requests, errors = re.search(r"RESULT (\S+) (\d+) (\d+) (\d+)", out).groups()
     if int(errors) != 0:
         raise SystemExit(f"{errors} failed requests at {path}")
