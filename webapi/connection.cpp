@@ -169,7 +169,8 @@ bool Connection::SendContinue() {
 void Connection::EnterGate() {
   phase_ = Phase::kCall;
   const auto waiter = [this] { return [self = shared_from_this()](bool admitted) { self->OnSlot(admitted); }; };
-  switch (shared_.gate.Enter(waiter)) {
+  turn_ = session_.TurnOfCall();
+  switch (shared_.gate.Enter(turn_, waiter)) {
   case Gate::Entry::kAdmitted:
     Call();
     break;
@@ -179,7 +180,7 @@ void Connection::EnterGate() {
     if (shared_.stopping) {
       Send(Stopping());
     } else {
-      Log(LogKind::kBusy, "a call was refused: every slot and every waiting place is taken");
+      Log(LogKind::kBusy, "a call was refused: every waiting place is taken");
       Send(Busy());
     }
     break;
@@ -194,7 +195,8 @@ void Connection::OnSlot(bool admitted) {
   }
 }
 
-// REQUIRES: a slot is held. It is given back after the call, or with callbacks after them.
+// REQUIRES: a slot and the turn are held. The turn is given back after the call; the slot too, or with callbacks after
+// them: they may take long, and calls that ask how far they have come must get in.
 void Connection::Call() {
   Outcome outcome = [this] {
     const Runners::Inside inside(shared_.runners);
@@ -205,7 +207,9 @@ void Connection::Call() {
   }
   callbacks_ = std::move(outcome.callbacks);
   if (callbacks_.Empty()) {
-    shared_.gate.Leave();
+    shared_.gate.Leave(turn_);
+  } else {
+    shared_.gate.EndTurn(turn_);
   }
   Send(outcome.answer);
 }
@@ -272,7 +276,7 @@ void Connection::RunCallbacks() {
   boost::asio::post(transport_.GetExecutor(), [callbacks = std::move(callbacks_), &shared = shared_]() mutable {
     const Runners::Inside inside(shared.runners);
     callbacks.Run();
-    shared.gate.Leave();
+    shared.gate.LeaveSlot();
   });
 }
 

@@ -77,6 +77,7 @@ private:
   std::string_view unsent_; // of out_, then of the file
   std::string_view file_;   // of the page, to be sent behind out_; not copied for each who asks
   bool closeAfter_ = false; // the answer ends the connection
+  Turn turn_;               // of the call that waits or is inside
   Callbacks callbacks_;     // of the answer being written; with any, a slot is held for them
   size_t drained_ = 0;
   int inARow_ = 0; // answers since the last wait, when requests are pipelined

@@ -19,7 +19,7 @@ enum class LogKind {
   kDescriptorLimit, ///< the process or the system has no descriptors left
   kSlowClient,      ///< a deadline was reached
   kRefusedRequest,  ///< too long, too deep, malformed
-  kBusy,            ///< every slot and waiting place taken
+  kBusy,            ///< every waiting place taken
   kTaskLimit,       ///< a poll task was refused
   kLogin,           ///< someone logged in
   kRefusedLogin,    ///< with a wrong user or password

@@ -27,7 +27,7 @@ Milliseconds SweepTime(const Config &config) {
 Server::Server(const Config &config, Service &service, SSL_CTX *tls)
     : config_(config), sweepTime_(SweepTime(config)), service_(service),
       connections_(config.connections, config.connectionsPerAddress, config.tlsConnections),
-      gate_(config.slots, config.queue,
+      gate_(config.slots, config.queue, service_.Groups(),
             [this](std::function<void()> work) { boost::asio::post(context_, std::move(work)); }),
       runners_(context_, config.slots), shared_{config, tls, service_, gate_, runners_, connections_},
       listener_(context_, shared_) {}

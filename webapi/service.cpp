@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <exception>
 #include <iterator>
+#include <map>
 #include <sstream>
 
 namespace vornwebapi {
@@ -72,9 +73,12 @@ Service::Service(const Config &config, const std::vector<VORN::APIEntry> &rows)
       hostNames_(ReadHostNames(config.hostNames)), json_{config.jsonDepth, config.jsonValues},
       tasks_({config.tasks, config.taskKeepTime}), metrics_(LabelsOf(rows)) {
   size_t label = Metrics::kFirstName + OwnPaths().size();
+  std::map<std::string, size_t> groups;
   for (const VORN::APIEntry &row : rows) {
-    routes_.emplace(PathOf(row), Route{row, NameOf(row), label++});
+    const size_t group = groups.emplace(row.api, groups.size()).first->second;
+    routes_.emplace(PathOf(row), Route{row, NameOf(row), label++, Turn{group, !Reads(row.method)}});
   }
+  groups_ = groups.size();
 }
 
 size_t Service::LabelOf(const Decision &decision, std::string_view path) const {

@@ -5,6 +5,7 @@
 #include "webapi/access.h"
 #include "webapi/answer.h"
 #include "webapi/callbacks.h"
+#include "webapi/gate.h"
 #include "webapi/json_scanner.h"
 #include "webapi/metrics.h"
 #include "webapi/request_reader.h"
@@ -26,6 +27,7 @@ struct Route {
   VORN::APIEntry row;
   std::string name;
   size_t label = 0; ///< in the metrics
+  Turn turn;        ///< the group are the rows of one API, in all its versions
 };
 
 /// What came of a call.
@@ -48,6 +50,7 @@ public:
   Metrics &Counts() { return metrics_; }
   void SetDocument(std::string document) { document_ = std::move(document); } ///< before anything is served
   size_t LoginBodyBytes() const { return loginBodyBytes_; }
+  size_t Groups() const { return groups_; } ///< of calls that wait for each other
 
   /// @param[in] path  the request's target, compared byte by byte
   /// @return null when there is no such row
@@ -74,6 +77,7 @@ private:
 
   Access access_;
   size_t loginBodyBytes_;
+  size_t groups_ = 0;
   HttpLimits http_;
   std::vector<std::string> hostNames_; // lower case
   JsonLimits json_;

@@ -63,6 +63,11 @@ Session::Wants Session::Refuse(Answer answer) {
   return Wants::kAnswer;
 }
 
+// Own calls lock what they share themselves, and a login must not wait for another's.
+Turn Session::TurnOfCall() const {
+  return route_ == nullptr ? Turn{} : route_->turn;
+}
+
 Outcome Session::Call() {
   if (route_ == nullptr) {
     return service_.CallOwn(decision_, peer_, reader_.Head(), reader_.Body());

@@ -32,6 +32,7 @@ public:
 
   static std::string_view ContinueText() { return "HTTP/1.1 100 Continue\r\n\r\n"; }
 
+  Turn TurnOfCall() const; ///< with kCall
   Outcome Call();
   size_t BodySize() const { return reader_.Body().size(); }         ///< with kCall
   bool HeadOnly() const { return reader_.Head().method == "HEAD"; } ///< an answer has no body
