@@ -222,7 +222,7 @@ TEST_F(RecordFile, SymbolicLinkIsNeitherReadNorReplaced) {
 
 TEST_F(RecordFile, FileThatOthersMayWriteIsNeitherReadNorReplaced) {
   WriteText(kPath, "[0]\na=\"1\"\n");
-  for (const mode_t mode : {0664, 0646, 0666}) {
+  for (const mode_t mode : {0664U, 0646U, 0666U}) {
     ASSERT_EQ(chmod(kPath, mode), 0);
     EXPECT_EQ(ReadError(), QARDC_ERR_ACCESS);
     EXPECT_NE(Write({{"1", {}}}), 0);

@@ -26,7 +26,6 @@ using vornnetwork::network::StaticRoute;
 namespace {
 
 constexpr char kFile4[] = "/etc/iproute2/config/static-route";
-constexpr char kFile6[] = "/etc/iproute2/config/static-route-v6";
 
 #if defined(NDEBUG) && !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
 constexpr bool kIsOptimised = true;
