@@ -1,5 +1,7 @@
 #include "webapi/transport.h"
 
+#include "webapi/log.h"
+
 #include <openssl/err.h>
 #include <sys/socket.h>
 
@@ -7,6 +9,10 @@
 
 namespace vornwebapi {
 namespace {
+
+// A handshake has at most five of them. Later ones renew keys (RFC 8446, section 4.6.3: every 24 million records) or
+// try to negotiate anew; the library would read them without end in one call, and hold the thread.
+constexpr int kMostHandshakeMessages = 32;
 
 Transport::Result ResultOfErrno() {
   return errno == EAGAIN || errno == EWOULDBLOCK || errno == EINTR ? Transport::Result::kWouldBlock
@@ -28,8 +34,20 @@ bool Transport::StartTls() {
   }
   SSL_set_accept_state(tls_.get());
   SSL_set_fd(tls_.get(), socket_.native_handle());
+  SSL_set_msg_callback(tls_.get(), OnTlsMessage);
+  SSL_set_msg_callback_arg(tls_.get(), this);
   broken_ = false;
   return true;
+}
+
+// What comes after such a "shutdown" is not looked at: a read ends.
+void Transport::OnTlsMessage(int sent, int /*version*/, int type, const void * /*bytes*/, size_t /*size*/, SSL *ssl,
+                             void *self) {
+  auto *transport = static_cast<Transport *>(self);
+  if (sent == 0 && type == SSL3_RT_HANDSHAKE && ++transport->handshakeMessages_ == kMostHandshakeMessages) {
+    Log(LogKind::kConnectionLimit, "a client began too many TLS handshakes and was cut");
+    SSL_set_shutdown(ssl, SSL_RECEIVED_SHUTDOWN);
+  }
 }
 
 Transport::Result Transport::ResultOfTls(int returned, bool &wantsOther, int other) {

@@ -63,6 +63,7 @@ private:
   };
 
   Result ResultOfTls(int returned, bool &wantsOther, int other);
+  static void OnTlsMessage(int sent, int version, int type, const void *bytes, size_t size, SSL *ssl, void *self);
   Result ReadTls(char *buffer, size_t size, size_t &count);
   Result WriteTls(std::string_view &bytes);
 
@@ -71,8 +72,9 @@ private:
   std::unique_ptr<SSL, FreeSsl> tls_;
   bool readWantsWrite_ = false; // a read or write that the handshake turns round
   bool writeWantsRead_ = false;
-  bool broken_ = false; // after a fault of TLS nothing may be sent
-  std::mutex closing_;  // the descriptor is not closed while another thread uses it
+  int handshakeMessages_ = 0; // that the client has sent
+  bool broken_ = false;       // after a fault of TLS nothing may be sent
+  std::mutex closing_;        // the descriptor is not closed while another thread uses it
 };
 
 } // namespace vornwebapi

@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <csignal>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -208,6 +209,40 @@ TEST_F(TlsFloodTest, HalfOpenHandshakesAreBoundedAndOthersAreServed) {
   EXPECT_TRUE(half.back()->ClosedByServer(std::chrono::seconds(16)));
   half.clear();
   ExpectMemoryBack(16U * 1024);
+}
+
+TEST_F(TlsFloodTest, OthersAreServedWhileKeysAreRenewedWithoutEnd) {
+  std::signal(SIGPIPE, SIG_IGN); // the library writes without MSG_NOSIGNAL
+  std::atomic<bool> over{false};
+  std::atomic<long> renewed{0};
+  std::atomic<int> cut{0};
+  std::vector<std::thread> attackers;
+  for (uint32_t each = 0; each < 8; ++each) {
+    attackers.emplace_back([this, each, &over, &renewed, &cut] {
+      while (!over) {
+        TlsClient client(server_.Port(), TLS1_3_VERSION, 0, 0x7f020001U + each);
+        EXPECT_TRUE(client.Handshake());
+        while (!over && client.RenewKeys(false)) {
+          ++renewed;
+        }
+        ++cut;
+        std::this_thread::sleep_for(milliseconds(20)); // it is not about the cost of handshakes
+      }
+    });
+  }
+  std::vector<milliseconds> times;
+  for (int count = 0; count < 200; ++count) {
+    times.push_back(TlsCall());
+  }
+  over = true;
+  for (std::thread &attacker : attackers) {
+    attacker.join();
+  }
+  std::printf("%ld renewals, %d connections cut, the other client's p99 %ld ms\n", renewed.load(), cut.load(),
+              Percentile99(times).count());
+  EXPECT_GT(cut, 8);
+  EXPECT_TRUE(!kMeasures || Percentile99(times) < milliseconds(500));
+  EXPECT_TRUE(server_.LogShows("a client began too many TLS handshakes and was cut"));
 }
 
 TEST_F(TlsFloodTest, EstablishedConnectionsAreBoundedToo) {

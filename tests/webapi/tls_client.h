@@ -5,6 +5,8 @@
 #include "tests/webapi/http_client.h"
 
 #include <openssl/ssl.h>
+#include <sys/socket.h>
+#include <sys/time.h>
 
 #include <memory>
 #include <string>
@@ -21,6 +23,8 @@ public:
     SSL_CTX_set_max_proto_version(context_.get(), version);
     tls_.reset(SSL_new(context_.get()));
     SSL_set_fd(tls_.get(), client_.Descriptor());
+    const timeval limit{20, 0};
+    setsockopt(client_.Descriptor(), SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
   }
 
   bool Handshake() { return SSL_connect(tls_.get()) == 1; }
@@ -35,6 +39,11 @@ public:
       answer.append(buffer, static_cast<size_t>(got));
     }
     return answer;
+  }
+  /// TLS 1.3: takes new keys, and asks the server to do so too or does not.
+  bool RenewKeys(bool ask) {
+    return SSL_key_update(tls_.get(), ask ? SSL_KEY_UPDATE_REQUESTED : SSL_KEY_UPDATE_NOT_REQUESTED) == 1 &&
+           SSL_do_handshake(tls_.get()) == 1;
   }
   SSL *Handle() { return tls_.get(); }
 

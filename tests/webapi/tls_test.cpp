@@ -5,6 +5,7 @@
 #include <sys/socket.h>
 #include <sys/stat.h>
 
+#include <csignal>
 #include <fstream>
 #include <iterator>
 #include <memory>
@@ -94,6 +95,29 @@ TEST_F(TlsTest, RenegotiationIsRefused) {
   }
   EXPECT_EQ(Talk(TLS1_2_VERSION, "GET / HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n").substr(0, 9),
             "HTTP/1.1 ");
+}
+
+TEST_F(TlsTest, KeysMayBeRenewedAFewTimes) {
+  for (const bool ask : {false, true}) {
+    TlsClient client(server_.Port(), TLS1_3_VERSION);
+    ASSERT_TRUE(client.Handshake());
+    for (int count = 0; count < 16; ++count) {
+      ASSERT_TRUE(client.RenewKeys(ask));
+    }
+    ASSERT_TRUE(client.Send("GET / HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n"));
+    EXPECT_EQ(client.ReadAll().substr(0, 9), "HTTP/1.1 ");
+  }
+}
+
+TEST_F(TlsTest, AClientThatRenewsItsKeysWithoutEndIsCut) {
+  std::signal(SIGPIPE, SIG_IGN); // the library writes without MSG_NOSIGNAL
+  TlsClient client(server_.Port(), TLS1_3_VERSION);
+  ASSERT_TRUE(client.Handshake());
+  for (int count = 0; count < 1000 && client.RenewKeys(false); ++count) {
+  }
+  client.Send("GET / HTTP/1.1\r\nHost: localhost\r\n\r\n");
+  EXPECT_EQ(client.ReadAll(), "");
+  EXPECT_TRUE(server_.LogShows("a client began too many TLS handshakes and was cut"));
 }
 
 class SlowTlsTest : public testing::Test {
