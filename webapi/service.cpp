@@ -113,7 +113,8 @@ Outcome Service::Call(const Route &route, const Caller &caller, const Peer &peer
   try {
     VORN::APIRequest::State state;
     if (const char *fault = ReadParameters(body, json_, state.parameters)) {
-      Log(LogKind::kRefusedRequest, "%s: %s", route.name.c_str(), fault);
+      Log(LogKind::kRefusedRequest, "%s from %s called %s: refused with 400, %s", caller.User().c_str(),
+          peer.from.c_str(), route.name.c_str(), fault);
       return {BadBody(fault), {}};
     }
     if (!access_.Stands(caller)) {

@@ -5,6 +5,20 @@
 #include <utility>
 
 namespace vornwebapi {
+namespace {
+
+/// The text of a refusal, which is one of the server's own and has no quotation marks.
+std::string MessageOf(const Answer &refusal) {
+  constexpr std::string_view kMember = R"("message":")";
+  const size_t found = refusal.body.find(kMember);
+  if (found == std::string::npos) {
+    return {};
+  }
+  const size_t begin = found + kMember.size();
+  return refusal.body.substr(begin, refusal.body.find('"', begin) - begin);
+}
+
+} // namespace
 
 Session::Session(Service &service, HostRule hosts, Peer peer)
     : service_(service), hosts_(std::move(hosts)), peer_(std::move(peer)), reader_(service.Limits(), hosts_) {}
@@ -20,7 +34,8 @@ Session::Wants Session::Step() {
     }
     return Wants::kCall;
   case RequestReader::State::kFailed:
-    Log(LogKind::kRefusedRequest, "request refused with %u: %s", reader_.Fault().status, reader_.Fault().body.c_str());
+    Log(LogKind::kRefusedRequest, "a request from %s refused with %u: %s", peer_.from.c_str(), reader_.Fault().status,
+        MessageOf(reader_.Fault()).c_str());
     return Refuse(reader_.Fault());
   default:
     return Wants::kBytes;

@@ -64,6 +64,9 @@ TEST_F(LogTest, AChangingCallIsALineOfWhoWhenceWhatAndItsOutcome) {
   EXPECT_EQ(Count("token " + id + " t from 127.0.0.1 called VORN.Test.Echo v1 error: failed with 4302"), 1U);
   EXPECT_EQ(Count("admin from 127.0.0.1 called VORN.Test.Throw v1 number: failed with 500"), 1U);
   EXPECT_EQ(Count(" called "), 3U); // a call that reads is none
+  Send("VORN.Test.Callback/1/set", person.Fields(), "{");
+  EXPECT_TRUE(
+      server_.LogShows("admin from 127.0.0.1 called VORN.Test.Callback v1 set: refused with 400, body is not JSON\n"));
 }
 
 TEST_F(LogTest, NoSecretIsEverInIt) {
@@ -147,13 +150,13 @@ TEST_F(LogTest, AFloodIsTenLinesAndThenANumber) {
   const auto start = std::chrono::steady_clock::now();
   flood(25);
   ASSERT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(9)) << "too slow to tell";
-  EXPECT_EQ(Count("request refused with 400"), 10U);
   ExpectRefusal(Send("login", "", LoginBody("wrong")), 401);
-  EXPECT_TRUE(server_.LogShows("refused: wrong")); // of another kind: not drowned
+  EXPECT_TRUE(server_.LogShows("refused: wrong")); // of another kind: not drowned; what came before has been read
+  EXPECT_EQ(Count("a request from 127.0.0.1 refused with 400: "), 10U);
   std::this_thread::sleep_until(start + std::chrono::seconds(11));
   flood(1);
   EXPECT_TRUE(server_.LogShows("refused request: 15 lines left out\n"));
-  EXPECT_EQ(Count("request refused with 400"), 11U);
+  EXPECT_EQ(Count("a request from 127.0.0.1 refused with 400: "), 11U);
 }
 
 } // namespace
