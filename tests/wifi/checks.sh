@@ -2,40 +2,7 @@
 # Runs as root in the emulator. Six radios: the access point's, three stations', each in a network namespace of its own, the
 # router's second one, and that of a network outside. The router is the real one: hostapd with the example configuration,
 # dnsmasq, the topology's program, the scanner, the server with the module.
-set -uo pipefail
-export PATH=/usr/sbin:/usr/bin:/sbin:/bin LC_ALL=C
-
-root=$(cd "${BASH_SOURCE[0]%/*}/../.." && pwd -P)
-build=${VORN_BUILD:?}
-api=127.0.0.1:8080
-failures=0
-. "$root/lab/lib/look.sh"
-. "$root/tests/wifi/radio.sh"
-. "$root/tests/wifi/outside.sh"
-
-check() { # DESCRIPTION COMMAND...
-  local description=$1
-  shift
-  if "$@"; then
-    echo "PASS $description"
-  else
-    echo "FAIL $description"
-    failures=$((failures + 1))
-  fi
-}
-
-need() { # as check; without it nothing that follows makes sense
-  local before=$failures
-  check "$@"
-  [ "$failures" = "$before" ] || finish
-}
-
-finish() {
-  if [ "$failures" != 0 ]; then
-    tail -n 40 "$work"/*.log
-  fi
-  exit "$((failures > 0))"
-}
+. "${BASH_SOURCE[0]%/*}/frame.sh"
 
 need "the router comes up" prepare_router
 need "hostapd has both networks on the air" start_hostapd

@@ -55,6 +55,7 @@ use_outside_network() { # NETWORK
 
 # What root writes to have the router join it; one frequency, so that nobody has to look at all the others first.
 configure_upstream() { # PASSPHRASE
+  mkdir -p "${upstream%/*}"
   (umask 077 && printf 'network={\n\tssid="outside"\n\tpsk="%s"\n\tscan_freq=2412\n}\n' "$1" >"$upstream")
 }
 
@@ -112,15 +113,20 @@ is_refused() { # TOPOLOGY REASON
 network() {
   ip -j link | jq -c '.[] | [.ifname, .master, (.flags | contains(["UP"]))]' | sort
   ip -j -4 address | jq -c '.[] | [.ifname, (.addr_info | map(.local))]' | sort
-  ip -4 route
+  ip -4 route | sed 's/ linkdown//' # a link that has just come up
   grep -v '^BRIDGE=$' /etc/sysconfig/network-scripts/ifcfg-eth0
   grep -H ^bridge= /etc/hostapd/*.conf
-  pgrep -x -a wpa_supplicant | grep -F /run/vorn
+  pgrep -x -a wpa_supplicant | grep -F /run/vorn | cut -d ' ' -f 2-
   pgrep -a -f '/udhcpc -i ' | grep -o -- '-i [^ ]*'
 }
 
+network_is() { # WHAT-NETWORK-PRINTED: names what differs
+  echo "$1" >"$work/wanted"
+  network | diff "$work/wanted" - >&2
+}
+
 unchanged() {
-  same "$before" "$(network)"
+  network_is "$before"
 }
 
 has_address() { # INTERFACE PATTERN
