@@ -109,5 +109,41 @@ killed_on_the_way_back router recover "when the WAN port is out of the bridge" a
 killed_on_the_way_back router "switch router" "when the provider is asked for an address" test -e "$provider_client"
 killed_on_the_way_back bridge recover "when the one bridge is there" test -e /sys/class/net/br0
 killed_on_the_way_back bridge start "when the WAN port is in it" test -e /sys/class/net/br0/brif/eth0
+
+# From here on with the watcher, which starts again what dies by itself.
+pid_of() { # PROGRAM: of the one that the platform has started
+  pgrep -f -- "^[^ ]*/$1 .*/run/vorn/"
+}
+
+is_another() { # PROGRAM PID
+  local now
+  now=$(pid_of "$1") && [ "$now" != "$2" ] && runs_once "$1"
+}
+
+dies_and_runs_again() { # PROGRAM
+  local old
+  old=$(pid_of "$1") && kill -KILL "$old" && eventually 20 is_another "$1" "$old"
+}
+
+system_log_has() { # TEXT
+  grep -qF -- "$1" "$work/system.log"
+}
+
+"$build/programs/vornwatch" 2>>"$work/watch.log" &
+check "wpa_supplicant dies and runs again" dies_and_runs_again wpa_supplicant
+check "it is a client as before" is_whole_client
+check "the DHCP client dies and runs again" dies_and_runs_again udhcpc
+check "it is a client as before" is_whole_client
+mv "$upstream" "$work/upstream"
+kill -KILL "$(pid_of wpa_supplicant)"
+check "what is missing for a start is told" eventually 20 system_log_has "start \"wpa_supplicant on $UPLINK\" failed"
+mv "$work/upstream" "$upstream"
+check "and when it is there, it is a client as before" eventually 40 is_whole_client
+kill -KILL "$(pid_of udhcpc)" "$(pid_of wpa_supplicant)"
+need "both die, and the router is switched away at once" vorntopology switch router
+sleep 3 # longer than the watcher waits before it looks again
+check "then it is a router, wholly" is_whole_router
+check "its DHCP client dies and runs again" dies_and_runs_again udhcpc
+check "it is a router as before" is_whole_router
 check "no sanitizer has something to say" not grep -hE 'Sanitizer|runtime error' "$work"/*.log
 finish
