@@ -1,6 +1,7 @@
 // vornwatch
-// Keeps the DHCP clients and wpa_supplicant running. Ends only with a signal, or with status 1 when the changes of the
-// network cannot be followed any more.
+// Keeps the DHCP clients and wpa_supplicant running, and tells a hostapd that fell silent the MAC filter that it was
+// not told, when it answers again. Ends only with a signal, or with status 1 when the changes of the network cannot be
+// followed any more.
 #include "host/utility/log.h"
 #include "host/watch/watcher.h"
 

@@ -4,6 +4,7 @@
 #include "host/network/topology_steps.h"
 #include "host/network/turn.h"
 #include "host/utility/log.h"
+#include "host/wireless/untold.h"
 
 #include <poll.h>
 #include <sys/inotify.h>
@@ -41,10 +42,13 @@ const WantedDaemon *Find(const std::vector<WantedDaemon> &daemons, const std::st
 } // namespace
 
 Watcher::Watcher() : changes_(inotify_init1(IN_NONBLOCK | IN_CLOEXEC)) {
-  // Where the daemons' pid files come and go, so that one that somebody else has started is watched too.
-  mkdir(kRunFolder, 0700);
-  if (!changes_.IsOpen() || inotify_add_watch(changes_.Get(), kRunFolder, IN_CREATE | IN_DELETE | IN_MOVED_TO) < 0) {
-    throw std::runtime_error(std::string(kRunFolder) + ": " + std::strerror(errno));
+  // Where the daemons' pid files come and go, so that one that somebody else has started is watched too, and where
+  // networks are noted that hostapd is to be told of.
+  for (const char *folder : {kRunFolder, kUntoldFolder}) {
+    mkdir(folder, 0700);
+    if (!changes_.IsOpen() || inotify_add_watch(changes_.Get(), folder, IN_CREATE | IN_DELETE | IN_MOVED_TO) < 0) {
+      throw std::runtime_error(std::string(folder) + ": " + std::strerror(errno));
+    }
   }
 }
 
@@ -90,6 +94,20 @@ Watcher::Clock::time_point Watcher::LookAtDaemons() {
   return until;
 }
 
+// A hostapd that fell silent says nothing when it goes on: it is asked.
+Watcher::Clock::time_point Watcher::LookAtFilters() {
+  if (UntoldNetworks().empty()) {
+    filters_ = BackOff();
+    return Clock::time_point::max();
+  }
+  if (Clock::now() < filters_.GetNext()) {
+    return filters_.GetNext();
+  }
+  filters_.Note(Clock::now());
+  Attempt("tell", "the MAC filters", TellUntold);
+  return Clock::now();
+}
+
 // What has changed is asked for anew anyway.
 void Watcher::Drain() {
   alignas(inotify_event) std::array<char, 4096> buffer{};
@@ -101,8 +119,8 @@ void Watcher::Drain() {
     if (got < 0 && errno != EINTR) {
       throw std::runtime_error(std::string("inotify: ") + std::strerror(errno));
     }
-    if (access(kRunFolder, F_OK) != 0) {
-      throw std::runtime_error(std::string(kRunFolder) + " is gone");
+    if (access(kUntoldFolder, F_OK) != 0) {
+      throw std::runtime_error(std::string(kUntoldFolder) + " is gone");
     }
   }
 }
@@ -124,7 +142,7 @@ void Watcher::Wait(Clock::time_point until) {
 
 void Watcher::Run() {
   for (;;) {
-    Wait(LookAtDaemons());
+    Wait(std::min(LookAtDaemons(), LookAtFilters()));
   }
 }
 
