@@ -21,8 +21,6 @@ kill_switch_when() { # TOPOLOGY CONDITION...
 absent() { [ ! -e "$1" ]; }
 begun() { true; }
 
-no_lock() { absent /tmp/topology.lock; }
-
 runs_once() { # PROGRAM: of those that the platform has started
   same 1 "$(pgrep -c -f -- "^[^ ]*/$1 .*/run/vorn/")"
 }
