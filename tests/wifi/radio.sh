@@ -104,6 +104,10 @@ network={
   scan_freq=2437
 }
 CONF
+  run_supplicant "$1"
+}
+
+run_supplicant() { # STATION
   in_station "$1" wpa_supplicant -B -t -f "$work/supplicant$1.log" -P "$work/supplicant$1.pid" -D nl80211 -i "wlan$1" \
     -c "$work/supplicant$1.conf" >/dev/null
 }
