@@ -1,7 +1,5 @@
 #include "host/network/daemon_process.h"
 
-#include "host/utility/unique_fd.h"
-
 #include <poll.h>
 #include <signal.h>
 #include <sys/stat.h>
@@ -105,6 +103,16 @@ std::vector<int> DaemonProcess::Find() const {
 bool DaemonProcess::IsRunning() const {
   const std::vector<int> found = Find();
   return std::any_of(found.begin(), found.end(), IsInBackground);
+}
+
+UniqueFd DaemonProcess::Watch() const {
+  for (const int pid : Find()) {
+    UniqueFd process = IsInBackground(pid) ? OpenProcess(pid) : UniqueFd();
+    if (process.IsOpen() && IsIt(pid)) { // asked again now that the number is pinned
+      return process;
+    }
+  }
+  return {};
 }
 
 void DaemonProcess::AwaitBackground() const {

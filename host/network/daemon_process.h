@@ -6,6 +6,8 @@
 #ifndef HOST_NETWORK_DAEMON_PROCESS_H
 #define HOST_NETWORK_DAEMON_PROCESS_H
 
+#include "host/utility/unique_fd.h"
+
 #include <string>
 #include <vector>
 
@@ -20,6 +22,8 @@ public:
   /// Whether it is in the background. One that still waits for its first success in the foreground does not count: its
   /// output goes to whoever started it, and without a reader it dies of it.
   bool IsRunning() const;
+  /// @return a descriptor that becomes readable when it ends (pidfd_open(2)); closed when it is not in the background
+  UniqueFd Watch() const;
   /// After its start: the process that was started ends before the one that stays is ready. Throws std::runtime_error
   /// when it is not there within a second.
   void AwaitBackground() const;

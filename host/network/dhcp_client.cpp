@@ -1,6 +1,7 @@
 #include "host/network/dhcp_client.h"
 
 #include "host/network/names.h"
+#include "host/network/netlink.h"
 #include "host/utility/program_runner.h"
 #include "host/utility/unique_fd.h"
 
@@ -8,8 +9,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <climits>
+#include <fstream>
+#include <optional>
 #include <stdexcept>
 
 namespace vornhost {
@@ -73,6 +77,18 @@ void DhcpClient::Resume(const std::string &address) const {
   mkdir(kRunFolder, 0700);
   const UniqueFd keep(open(KeepFile().c_str(), O_CREAT | O_WRONLY | O_CLOEXEC | O_NOFOLLOW, 0644));
   Run({"-b", "-t", "1", "-T", "1", "-A", "5", "-r", address});
+}
+
+void DhcpClient::ResumeLease() const {
+  std::string leased; // as udhcpc.script has written it, "192.0.2.7/24"
+  std::getline(std::ifstream(RunFile(interface_, ".address")), leased);
+  Netlink netlink;
+  const std::optional<Link> link = netlink.FindLink(interface_);
+  const std::vector<Address> addresses = netlink.Addresses();
+  const auto found = std::find_if(addresses.begin(), addresses.end(), [&](const Address &address) {
+    return link && address.index == link->index && address.text == leased;
+  });
+  found != addresses.end() ? Resume(found->Host()) : Start();
 }
 
 } // namespace vornhost

@@ -15,6 +15,9 @@ public:
 
   bool IsRunning() const { return process_.IsRunning(); }
 
+  /// As DaemonProcess's.
+  UniqueFd Watch() const { return process_.Watch(); }
+
   /// Starts the client and waits for its first lease, about 10 seconds. Throws std::runtime_error when none came; the
   /// client does not run then.
   void StartWithLease() const;
@@ -27,6 +30,10 @@ public:
   /// it in place until the server has answered.
   /// @param[in] address  IPv4; empty: it has none
   void Resume(const std::string &address) const;
+
+  /// Starts the client again after it died: as Resume when the interface still has the address of its lease, else as
+  /// Start.
+  void ResumeLease() const;
 
   /// Ends the client; what it configured stays. Throws std::runtime_error when it lives on.
   void Stop() const { process_.Stop(); }

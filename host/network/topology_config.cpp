@@ -103,9 +103,17 @@ const char *ConfiguredTopology() {
   return wan.bridge == kLanBridge ? kClientTopology : kBridgeTopology;
 }
 
-PortConfig ReadOneBridgeConfig() {
-  const PortConfig bridge = ReadPortConfig(kOneBridgeConfig);
-  return bridge.present ? bridge : ReadPortConfig(kWanConfig);
+// In bridge topology as ifcfg-br0 says, or without it as the WAN port would.
+PortConfig ReadUplinkConfig(const std::string &topology) {
+  PortConfig config;
+  if (topology == kClientTopology) {
+    config.dhcp = true; // a network that one joins tells who one is in it
+    return config;
+  }
+  if (topology == kBridgeTopology) {
+    config = ReadPortConfig(kOneBridgeConfig);
+  }
+  return config.present ? config : ReadPortConfig(kWanConfig);
 }
 
 void WriteWanBridge(const std::string &bridge) {

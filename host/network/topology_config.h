@@ -26,9 +26,8 @@ PortConfig ReadPortConfig(const char *path);
 /// @return the topology that the WAN port's file says
 const char *ConfiguredTopology();
 
-/// How the router reaches the network outside in bridge topology: as ifcfg-br0 says, or without it as the WAN port
-/// does.
-PortConfig ReadOneBridgeConfig();
+/// How the way out of a topology gets its address.
+PortConfig ReadUplinkConfig(const std::string &topology);
 
 /// Writes into the WAN port's file whose port it is.
 /// @param[in] bridge  empty: nobody's

@@ -220,13 +220,7 @@ void LetBridgesForward() {
 }
 
 void ConnectUplink(Netlink &netlink, const std::string &topology, const std::string &uplink, bool leaseNeeded) {
-  PortConfig config;
-  if (topology == kClientTopology) {
-    config.dhcp = true; // a network that one joins tells who one is in it
-  } else {
-    config = topology == kBridgeTopology ? ReadOneBridgeConfig() : ReadPortConfig(kWanConfig);
-  }
-  ConnectPort(netlink, uplink, config, leaseNeeded);
+  ConnectPort(netlink, uplink, ReadUplinkConfig(topology), leaseNeeded);
 }
 
 bool ApplyConfiguration(Netlink &netlink) {

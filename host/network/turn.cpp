@@ -18,8 +18,9 @@ namespace vornhost {
 
 namespace {
 
-// A switch is refused while another is under way, but not for the moment that a look at the network takes.
-constexpr std::chrono::milliseconds kPatience{2000};
+// A switch is refused while another is under way, but not for the moments that a look at the network takes, or the
+// start of a daemon that had died.
+constexpr std::chrono::milliseconds kPatience{5000};
 constexpr std::chrono::milliseconds kPause{20};
 
 } // namespace

@@ -10,6 +10,7 @@
 #include "host/wireless/mac_filter.h"
 #include "host/wireless/network_acl.h"
 #include "host/wireless/stations.h"
+#include "host/wireless/untold.h"
 #include "platform/utility.h"
 
 #include <sys/stat.h>
@@ -142,7 +143,8 @@ void TellHostapd(const WirelessAdapter &adapter, const MacFilter &filter, Deadli
 // REQUIRES: the old files are back. The network that failed is the last, so that the others have their lists before it
 // can use the time up. One that answers but does not take its lists has the old policy as the last word: a network with
 // a list of those who may connect stays shut; one without it is open to those it denied, but not shut to the home.
-void TellOldFilter(std::vector<OldNetwork> networks) {
+// @return those that were not told the whole
+std::vector<OldNetwork> TellOldFilter(std::vector<OldNetwork> networks) {
   const Deadline deadline = std::chrono::steady_clock::now() + kUndoLimit;
   const auto isRestored = [](const OldNetwork &old, Deadline until, bool (*tell)(ControlSocket &, const NetworkAcl &)) {
     ControlSocket control(old.network->control, until);
@@ -157,6 +159,28 @@ void TellOldFilter(std::vector<OldNetwork> networks) {
     const char *left =
         isRestored(old, last, TellPolicy) ? "the old policy without its lists" : "a part of a MAC filter";
     LogError("%s: hostapd has %s until it is told again or started again", old.network->name.c_str(), left);
+  }
+  return networks;
+}
+
+std::vector<std::string> NamesOf(const std::vector<OldNetwork> &networks) {
+  std::vector<std::string> names;
+  std::transform(networks.begin(), networks.end(), std::back_inserter(names),
+                 [](const OldNetwork &old) { return old.network->name; });
+  return names;
+}
+
+// What was owed to a network before the change is owed to it still, unless it was told.
+// @param[in] noted  for this change alone
+void TakeBack(std::vector<OldNetwork> before, size_t told, const std::vector<std::string> &noted) {
+  before.resize(told);
+  std::vector<std::string> done = NamesOf(before);
+  done.insert(done.end(), noted.begin(), noted.end());
+  const std::vector<std::string> left = NamesOf(TellOldFilter(std::move(before)));
+  for (const std::string &name : done) {
+    if (std::find(left.begin(), left.end(), name) == left.end()) {
+      StrikeOutUntold(name);
+    }
   }
 }
 
@@ -181,6 +205,7 @@ void WriteAdapter(const WirelessAdapter &adapter, const Json::Value &config) {
   const Deadline deadline = std::chrono::steady_clock::now() + kAnswerLimit;
   CheckAnswers(adapter, deadline);
   const auto left = deadline - std::chrono::steady_clock::now(); // the disk's time is not hostapd's
+  const std::vector<std::string> noted = NoteUntold(NamesOf(before));
   FileChanges changes;
   size_t told = 0;
   try {
@@ -188,9 +213,11 @@ void WriteAdapter(const WirelessAdapter &adapter, const Json::Value &config) {
     TellHostapd(adapter, filter, std::chrono::steady_clock::now() + left, told);
   } catch (...) {
     changes.Undo();
-    before.resize(told);
-    TellOldFilter(std::move(before));
+    TakeBack(std::move(before), told, noted);
     throw;
+  }
+  for (const OldNetwork &network : before) {
+    StrikeOutUntold(network.network->name);
   }
 }
 

@@ -32,11 +32,8 @@ bool Holds(const std::string &text, const char *part) {
 }
 
 // A network that has refused the station is left alone for a while.
-const char *WhyNotJoined(const std::string &interface) {
-  if (Holds(Ask(interface, "LIST_NETWORKS"), "[TEMP-DISABLED]")) {
-    return "the network outside does not let us in: is the key right?";
-  }
-  return "the network outside is not found, or does not answer";
+bool HasRefused(const std::string &interface) {
+  return Holds(Ask(interface, "LIST_NETWORKS"), "[TEMP-DISABLED]");
 }
 
 } // namespace
@@ -71,9 +68,13 @@ void Supplicant::Start(const std::string &interface) const {
 
 void Supplicant::AwaitJoined(const std::string &interface) {
   const auto end = std::chrono::steady_clock::now() + kJoinLimit;
+  bool refused = false; // at the end it may be trying once more
   while (!Holds(Ask(interface, "STATUS"), "wpa_state=COMPLETED\n")) {
+    refused = refused || HasRefused(interface);
     if (std::chrono::steady_clock::now() > end) {
-      throw std::runtime_error(interface + ": " + WhyNotJoined(interface));
+      throw std::runtime_error(interface + ": " +
+                               (refused ? "the network outside does not let us in: is the key right?"
+                                        : "the network outside is not found, or does not answer"));
     }
     std::this_thread::sleep_for(kPause);
   }

@@ -21,6 +21,9 @@ public:
 
   bool IsRunning() const { return process_.IsRunning(); }
 
+  /// As DaemonProcess's.
+  UniqueFd Watch() const { return process_.Watch(); }
+
   /// Starts it with the interface's configuration; from then on it joins the network whenever that is there. Throws
   /// std::runtime_error when it cannot be started.
   void Start(const std::string &interface) const;

@@ -31,6 +31,7 @@ start() {
   while [ ! -S /run/dev-log ]; do sleep 0.005; done
   /usr/vorn/sbin/vorntimecontrol --restore
   /usr/vorn/sbin/vorntopology start
+  launch vornwatch /usr/vorn/sbin/vornwatch # as vorn-watch.service does
   launch vornroutes /usr/vorn/sbin/vornroutes watch # as vorn-routes.service does
   # The provider routes this prefix here; a switch takes it away with lbr0. Nobody else has the address, and until a look
   # for a duplicate had ended, dnsmasq would advertise no prefix.

@@ -123,6 +123,8 @@ kill_server() {
   eventually 5 not kill -0 "$server_pid" 2>/dev/null
 }
 
+has_first_lease() { [ -n "$(addresses_of router eth0)" ]; }
+
 has_second_lease() { [ -n "$(addresses_of router eth1)" ]; }
 
 bring_second_up() { # the router's second way out

@@ -7,7 +7,7 @@ set -uo pipefail
 exec >/dev/ttyS1 2>&1 </dev/ttyS1
 stty -F /dev/ttyS1 raw -echo
 
-readonly UNITS="vorn-timecontrol vorn-network vorn-routes vorn-devices vornwebd dnsmasq cron"
+readonly UNITS="vorn-timecontrol vorn-network vorn-watch vorn-routes vorn-devices vornwebd dnsmasq cron"
 readonly API=https://127.0.0.1:8443
 readonly MEMORY=/var/lib/try-install # what the first boot tells the second
 readonly PASSWORD="correct horse battery"

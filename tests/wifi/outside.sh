@@ -27,7 +27,7 @@ stop_serving() { # NAMESPACE
   kill "$(cat "$work/$1.pid")" && eventually 5 not test -e "$work/$1.pid"
 }
 
-start_outside() {
+start_outside() { # [NETWORK]
   ip netns add outside
   iw phy "phy$OUTSIDE_RADIO" set netns name outside
   ip -n outside link set lo up
@@ -44,7 +44,7 @@ rsn_pairwise=CCMP
 wpa_passphrase=outside-key-1
 CONF
   ip netns exec outside hostapd -B -t -f "$work/outside-hostapd.log" "$work/outside.conf" || return
-  use_outside_network 10.77.0
+  use_outside_network "${1:-10.77.0}"
 }
 
 use_outside_network() { # NETWORK
@@ -55,6 +55,7 @@ use_outside_network() { # NETWORK
 
 # What root writes to have the router join it; one frequency, so that nobody has to look at all the others first.
 configure_upstream() { # PASSPHRASE
+  mkdir -p "${upstream%/*}"
   (umask 077 && printf 'network={\n\tssid="outside"\n\tpsk="%s"\n\tscan_freq=2412\n}\n' "$1" >"$upstream")
 }
 
@@ -81,13 +82,20 @@ says() { # TEXT: since the last switch that was asked for
   tail -n "+$said" "$work/system.log" | grep -qF -- "$1"
 }
 
+# The lock is looked at without a process, because the emulator has one slow processor, and the switch needs it.
+no_lock() { [ ! -e /tmp/topology.lock ]; }
+
+begins_to_switch_to() { # TOPOLOGY
+  said=$(($(wc -l <"$work/system.log") + 1))
+  ask_for "$1" && eventually 20 test -e /tmp/topology.lock
+}
+
 # A starved machine takes longer for a lease than a switch waits, which is then undone, and tried again.
 switch_to() { # TOPOLOGY
   local try
   : >"$work/supplicant$PHONE.log" # for has_kept_link
   for try in 1 2 3; do
-    said=$(($(wc -l <"$work/system.log") + 1))
-    ask_for "$1" && eventually 90 switch_has_ended_as_told || return
+    begins_to_switch_to "$1" && eventually 90 no_lock && eventually 10 switch_has_ended_as_told || return
     ! says "switched from" || { ends_up_in "$1"; return; }
     echo "# $1: try $try failed"
   done
@@ -98,9 +106,13 @@ switch_has_ended_as_told() {
   says "switched from" || says "Failed to SwitchTopology"
 }
 
+has_failed_to_switch_to() { # TOPOLOGY REASON
+  eventually 90 no_lock && eventually 10 says "switch from router to $1 failed" && says "$2" && eventually 20 switch_ended ||
+    { tail -n "+$said" "$work/system.log" >&2; return 1; }
+}
+
 fails_to_switch_to() { # TOPOLOGY REASON
-  said=$(($(wc -l <"$work/system.log") + 1))
-  ask_for "$1" && eventually 90 says "$2" && eventually 90 switch_ended && says "switch from router to $1 failed"
+  begins_to_switch_to "$1" && has_failed_to_switch_to "$1" "$2"
 }
 
 is_refused() { # TOPOLOGY REASON
@@ -112,15 +124,20 @@ is_refused() { # TOPOLOGY REASON
 network() {
   ip -j link | jq -c '.[] | [.ifname, .master, (.flags | contains(["UP"]))]' | sort
   ip -j -4 address | jq -c '.[] | [.ifname, (.addr_info | map(.local))]' | sort
-  ip -4 route
+  ip -4 route | sed 's/ linkdown//' # a link that has just come up
   grep -v '^BRIDGE=$' /etc/sysconfig/network-scripts/ifcfg-eth0
   grep -H ^bridge= /etc/hostapd/*.conf
-  pgrep -x -a wpa_supplicant | grep -F /run/vorn
+  pgrep -x -a wpa_supplicant | grep -F /run/vorn | cut -d ' ' -f 2-
   pgrep -a -f '/udhcpc -i ' | grep -o -- '-i [^ ]*'
 }
 
+network_is() { # WHAT-NETWORK-PRINTED: names what differs
+  echo "$1" >"$work/wanted"
+  network | diff "$work/wanted" - >&2
+}
+
 unchanged() {
-  same "$before" "$(network)"
+  network_is "$before"
 }
 
 has_address() { # INTERFACE PATTERN

@@ -104,6 +104,10 @@ network={
   scan_freq=2437
 }
 CONF
+  run_supplicant "$1"
+}
+
+run_supplicant() { # STATION
   in_station "$1" wpa_supplicant -B -t -f "$work/supplicant$1.log" -P "$work/supplicant$1.pid" -D nl80211 -i "wlan$1" \
     -c "$work/supplicant$1.conf" >/dev/null
 }
@@ -160,6 +164,11 @@ SCRIPT
 
 reaches() { # STATION ADDRESS
   in_station "$1" busybox ping -q -c 2 -W 3 "$2" >/dev/null
+}
+
+# For a second: who is reached answers in a few hundredths of one.
+hears_nothing() { # STATION ADDRESS
+  ! in_station "$1" busybox ping -q -c 1 -W 1 "$2" >/dev/null
 }
 
 # The laptop of a neighbour, who guesses.
@@ -232,14 +241,20 @@ are_counted() { # ALL LOCAL GUEST
   [ "$1 $2 $3" = "$(online all) $(online local) $(online guest)" ]
 }
 
-listing_ended() {
-  listing=$(call ConnectionList 1 get | sed -n 1p)
-  jq -e '.data.finish' <<<"$listing" >/dev/null
+# The task that looks at the network now reads the air first. Then it asks each station for a name, which none has here, with
+# ten seconds' patience: that is left to itself meanwhile.
+begins_to_list() {
+  eventually 20 listing_has 3
 }
 
-# The task that looks at the network now.
+listing_has() { # STATIONS
+  call ConnectionList 1 get | sed -n 1p | jq -e --argjson count "$1" '.data.stations | length == $count' >/dev/null 2>&1
+}
+
 lists_stations() {
-  eventually 60 listing_ended && told_over_api "$listing" '192\.168\.1\.' '192\.168\.2\.' "$PHONE" "$LAPTOP" "$TABLET"
+  listing=$(call ConnectionList 1 get | sed -n 1p)
+  jq -e '.data.finish' <<<"$listing" >/dev/null &&
+    told_over_api "$listing" '192\.168\.1\.' '192\.168\.2\.' "$PHONE" "$LAPTOP" "$TABLET"
 }
 
 # An answer of "get" lists these stations and no others, each with what the air tells of it.
