@@ -23,7 +23,7 @@ namespace {
 // The kernel says some things of a link that has come up later than "up" itself, from a thread of its own: the carrier,
 // and the link-local and multicast routes, here of both ends of three pairs.
 bool LinksAreSettled() {
-  return Shell("ip -4 route show table all | grep linkdown | wc -l") == "0\n" &&
+  return Shell("{ ip -4 route show table all; ip -6 route show table all; } | grep linkdown | wc -l") == "0\n" &&
          Shell("ip -6 route show table all | grep -E '^(fe80::/64|multicast ff00::/8) ' | wc -l") == "12\n";
 }
 
