@@ -4,6 +4,7 @@
 set -uo pipefail
 
 build=${1:?"units_test.sh BUILD"}
+[ -n "${VORN_PRIVATE_VIEW:-}" ] || { echo "Run it as: private_view -- units_test.sh BUILD" >&2; exit 2; } # it installs
 if ! command -v systemd-analyze >/dev/null; then
   echo "SKIP: systemd-analyze is not installed"
   exit 77 # CTest's mark of a skipped test
