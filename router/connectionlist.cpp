@@ -174,6 +174,11 @@ std::optional<std::string_view> UsableMac(const Json::Value &record, const Expre
   return whole && macPattern.Matches(mac->data()) ? mac : std::nullopt;
 }
 
+// As ConvertToText, but a text is moved.
+Json::Value TakeText(Json::Value &value) {
+  return value.isString() ? Json::Value(std::move(value)) : Json::Value(router::ConvertToText(value).value_or(""));
+}
+
 Json::Value &StationsOf(Json::Value &result) {
   return AsObject(result)[station::kStations];
 }
@@ -385,7 +390,7 @@ bool ConnectionList::CombineJsonData(Json::Value &stations, Json::Value &arpStat
     if (known == nullptr) {
       known = &stations.append(std::move(wired)); // its texts stay where they are
     } else if (MemberText(wired, station::kNetif).find("br") != std::string::npos) {
-      (*known)[station::kIp] = MemberText(wired, station::kIp);
+      (*known)[station::kIp] = TakeText(wired[station::kIp]);
     }
     wired = Json::Value(); // while it is at hand: freed later, a long table would be fetched from memory once more
   }
