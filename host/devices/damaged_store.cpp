@@ -12,6 +12,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <filesystem>
 
 namespace vornhost {
 
@@ -102,7 +103,7 @@ int CopyTable(Database &from, const Table &table, Database &to) {
 
 // @return how many of the owner's entries are in it
 int BuildNewStore(Database &damaged, const char *tables) {
-  std::remove(kNewStore);
+  std::remove(kNewStore); // of a try that failed
   mknod(kNewStore, S_IFREG | 0600, 0);
   Database fresh(kNewStore);
   fresh.Execute("PRAGMA journal_mode = MEMORY; PRAGMA synchronous = FULL"); // nobody uses it before it is whole
@@ -126,6 +127,19 @@ void ReplaceDamagedStore(Database &damaged, const char *tables, const std::strin
   BringStore();
   LogWarning("the device store was damaged (%s): it is kept as %s, a new one has %d of the owner's names",
              LogText(reason).c_str(), AsideName(0).c_str(), names);
+}
+
+bool PutAsideCutStore() {
+  std::error_code absent;
+  const auto size = std::filesystem::file_size(std::string(kDeviceStore) + kJournal, absent);
+  if (absent || size == 0) {
+    return false;
+  }
+  MakeRoom();
+  Move(kDeviceStore, AsideName(0));
+  BringStore();
+  LogWarning("the device store was cut to nothing: its journal is kept as %s%s", AsideName(0).c_str(), kJournal);
+  return true;
 }
 
 void BringStore() {

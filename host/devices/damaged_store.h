@@ -27,6 +27,11 @@ void ReplaceDamagedStore(Database &damaged, const char *tables, const std::strin
 /// REQUIRES: the turn at the store.
 void BringStore();
 
+/// For a store of no bytes. With a journal beside it, it was cut: SQLite would take the journal for a leftover and
+/// delete it. Both are put aside, with a warning in the log, and there is a new store of no bytes.
+/// @return false when there is no journal: the store is just new
+bool PutAsideCutStore();
+
 } // namespace vornhost
 
 #endif

@@ -61,6 +61,9 @@ struct stat PreparedFile() {
   if (info.st_uid != geteuid()) {
     throw DatabaseError(std::string(kDeviceStore) + " is somebody else's");
   }
+  if (info.st_size == 0 && PutAsideCutStore()) {
+    lstat(kDeviceStore, &info);
+  }
   return info;
 }
 
@@ -76,6 +79,7 @@ constexpr char kReadOwner[] = "SELECT mac, name, type FROM owner";
 
 void Prepare(Database &database) {
   constexpr char kVersion[] = "PRAGMA user_version";
+  database.CheckForm(); // before anything is written: what is put aside is as it was found
   if (NumberOf(database, kVersion) == 0) {
     if (NumberOf(database, "SELECT count(*) FROM sqlite_schema") != 0) {
       throw DamagedDatabase("device store: it is another database");
@@ -84,7 +88,6 @@ void Prepare(Database &database) {
     database.Execute(kTables);
     transaction.Commit();
   }
-  database.CheckForm();
   if (NumberOf(database, kVersion) != kSchema) { // of a later version of the platform, which will need it again
     throw DatabaseError(std::string(kDeviceStore) + " is of another version");
   }

@@ -260,12 +260,12 @@ void Scanner::FetchOneDescription() {
 
 // What was written is in another file now, which may be a new one.
 void Scanner::OpenStoreAnew() {
-  storeDamaged_ = false;
   DeviceStore fresh;
   if (store_.IsCurrent()) {
     LogError("devices: the store fails, and yet there is nothing wrong with its form");
   }
   store_ = std::move(fresh);
+  storeDamaged_ = false;
   storeVersion_ = store_.DataVersion();
   owner_ = store_.OwnerEntries();
   table_.NoteAllUnwritten();

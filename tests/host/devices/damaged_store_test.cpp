@@ -167,6 +167,17 @@ TEST_F(DamagedStore, AnEmptyFileIsANewStore) {
   EXPECT_EQ(LogSoFar(), "");
 }
 
+TEST_F(DamagedStore, AFileCutToNothingIsPutAsideWithItsJournal) {
+  const std::string journal = "a journal with the owner's last names" + std::string(5000, '.');
+  hosttest::WriteText(kDeviceStore, "");
+  hosttest::WriteText(std::string(kDeviceStore) + "-wal", journal);
+  EXPECT_EQ(List(), Json::Value(Json::arrayValue));
+  EXPECT_EQ(hosttest::ReadText(kAside), "");
+  EXPECT_EQ(hosttest::ReadText(std::string(kAside) + "-wal"), journal);
+  EXPECT_THAT(LogSoFar(), HasSubstr("was cut to nothing"));
+  EXPECT_EQ(Name(kMac, "name"), 0);
+}
+
 TEST_F(DamagedStore, ATextInItsPlaceIsPutAside) {
   const std::string text = "no database, but a text that is long enough to be looked at as one" + std::string(600, '.');
   hosttest::WriteText(kDeviceStore, text);
