@@ -51,6 +51,12 @@ bool IsInOurNetwork(int pid) {
          own.st_dev == other.st_dev;
 }
 
+// Anybody may give a process of his any name and arguments.
+bool IsOurs(int pid) {
+  struct stat info {};
+  return stat(("/proc/" + std::to_string(pid)).c_str(), &info) == 0 && info.st_uid == geteuid();
+}
+
 bool IsInBackground(int pid) {
   std::error_code failed;
   return fs::read_symlink("/proc/" + std::to_string(pid) + "/fd/1", failed) == "/dev/null";
@@ -84,7 +90,7 @@ DaemonProcess::DaemonProcess(std::string program, std::string option, std::strin
 
 bool DaemonProcess::IsIt(int pid) const {
   const std::vector<std::string> arguments = ReadArguments(pid);
-  return HasOption(arguments, option_, pidFile_) && fs::path(arguments[0]).filename() == program_ &&
+  return HasOption(arguments, option_, pidFile_) && fs::path(arguments[0]).filename() == program_ && IsOurs(pid) &&
          IsInOurNetwork(pid);
 }
 
@@ -105,9 +111,10 @@ bool DaemonProcess::IsRunning() const {
   return std::any_of(found.begin(), found.end(), IsInBackground);
 }
 
-UniqueFd DaemonProcess::Watch() const {
+UniqueFd DaemonProcess::Watch(const std::string &option, const std::string &value) const {
   for (const int pid : Find()) {
-    UniqueFd process = IsInBackground(pid) ? OpenProcess(pid) : UniqueFd();
+    const bool wanted = IsInBackground(pid) && (option.empty() || HasOption(ReadArguments(pid), option, value));
+    UniqueFd process = wanted ? OpenProcess(pid) : UniqueFd();
     if (process.IsOpen() && IsIt(pid)) { // asked again now that the number is pinned
       return process;
     }

@@ -23,7 +23,9 @@ public:
   /// output goes to whoever started it, and without a reader it dies of it.
   bool IsRunning() const;
   /// @return a descriptor that becomes readable when it ends (pidfd_open(2)); closed when it is not in the background
-  UniqueFd Watch() const;
+  UniqueFd Watch() const { return Watch("", ""); }
+  /// The same for one that was started with that option and value, too.
+  UniqueFd Watch(const std::string &option, const std::string &value) const;
   /// After its start: the process that was started ends before the one that stays is ready. Throws std::runtime_error
   /// when it is not there within a second.
   void AwaitBackground() const;

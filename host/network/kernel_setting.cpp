@@ -12,4 +12,8 @@ void WriteSetting(const std::string &path, const std::string &value) {
   }
 }
 
+void ListenToRouters(const std::string &interface) {
+  WriteSetting("/proc/sys/net/ipv6/conf/" + interface + "/accept_ra", "2");
+}
+
 } // namespace vornhost

@@ -9,6 +9,10 @@ namespace vornhost {
 /// A setting that this kernel does not have, or that may not be changed here, stays as it is.
 void WriteSetting(const std::string &path, const std::string &value);
 
+/// An interface takes router advertisements. A host that forwards does not, unless told so (kernel: ip-sysctl,
+/// accept_ra).
+void ListenToRouters(const std::string &interface);
+
 } // namespace vornhost
 
 #endif

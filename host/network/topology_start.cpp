@@ -35,8 +35,7 @@ bool HasIpv4(Netlink &netlink, int index) {
 
 void ConnectPort(Netlink &netlink, const std::string &port, const PortConfig &config, bool leaseNeeded) {
   NetworkState state(netlink);
-  // A host that forwards does not listen to router advertisements, unless told so (kernel: ip-sysctl, accept_ra).
-  WriteSetting("/proc/sys/net/ipv6/conf/" + port + "/accept_ra", "2");
+  ListenToRouters(port);
   if (config.dhcp) {
     leaseNeeded ? DhcpClient(port).StartWithLease() : DhcpClient(port).Start();
   } else if (!config.address.empty()) {
@@ -142,7 +141,7 @@ private:
       whole_ = false;
       return;
     }
-    if (topology_ == kClientTopology && !Supplicant().IsRunning()) {
+    if (topology_ == kClientTopology && !Supplicant().Watch(layout_.uplink).IsOpen()) {
       Do("join over", layout_.uplink, [this] { Supplicant().Start(layout_.uplink); });
     }
     Do("connect", layout_.uplink, [this] {

@@ -17,6 +17,9 @@ public:
   /// What has run for so long counts as well.
   static constexpr std::chrono::seconds kLasting{120};
 
+  /// @param[in] longest  that a pause becomes
+  explicit BackOff(std::chrono::seconds longest = kLongestPause) : longest_(longest) {}
+
   /// @return the moment from which on it may be started
   Clock::time_point GetNext() const { return next_; }
 
@@ -27,10 +30,11 @@ public:
     }
     last_ = now;
     next_ = now + pause_;
-    pause_ = std::min(pause_ * 2, kLongestPause);
+    pause_ = std::min(pause_ * 2, longest_);
   }
 
 private:
+  std::chrono::seconds longest_;
   Clock::time_point last_{};
   Clock::time_point next_{};
   std::chrono::seconds pause_ = kFirstPause;

@@ -2,6 +2,7 @@
 
 #include "host/network/current_topology.h"
 #include "host/network/dhcp_client.h"
+#include "host/network/kernel_setting.h"
 #include "host/network/names.h"
 #include "host/network/topology.h"
 #include "host/network/topology_config.h"
@@ -12,13 +13,22 @@ namespace vornhost {
 
 namespace {
 
-// Without the interface there is nothing to serve; with it gone, its client stays and waits for it.
+// Without the interface there is nothing to serve, until it is plugged in; with it gone, its client stays and waits for
+// it. One that is plugged in again has forgotten what it was told of router advertisements.
 void AddClient(const std::string &interface, const PortConfig &config, WantedDaemons &wanted) {
-  if (config.dhcp && HasInterface(interface.c_str())) {
-    const DhcpClient client(interface);
-    wanted.daemons.push_back(
-        {"udhcpc on " + interface, [client] { return client.Watch(); }, [client] { client.ResumeLease(); }});
+  if (!config.dhcp) {
+    return;
   }
+  if (!HasInterface(interface.c_str())) {
+    wanted.isWhole = false;
+    return;
+  }
+  const DhcpClient client(interface);
+  wanted.daemons.push_back({"udhcpc on " + interface, [client] { return client.Watch(); },
+                            [client, interface] {
+                              ListenToRouters(interface);
+                              client.ResumeLease();
+                            }});
 }
 
 } // namespace
@@ -33,7 +43,7 @@ WantedDaemons FindWantedDaemons() {
   }
   const std::string upstream = topology == kClientTopology ? JoinedUpstream() : "";
   if (!upstream.empty()) {
-    wanted.daemons.push_back({"wpa_supplicant on " + upstream, [] { return Supplicant().Watch(); },
+    wanted.daemons.push_back({"wpa_supplicant on " + upstream, [upstream] { return Supplicant().Watch(upstream); },
                               [upstream] { Supplicant().Start(upstream); }});
   }
   const std::string uplink = LayoutOf(topology, upstream).uplink;

@@ -97,7 +97,7 @@ Watcher::Clock::time_point Watcher::LookAtDaemons() {
 // A hostapd that fell silent says nothing when it goes on: it is asked.
 Watcher::Clock::time_point Watcher::LookAtFilters() {
   if (UntoldNetworks().empty()) {
-    filters_ = BackOff();
+    filters_ = BackOff(kLongestSilence);
     return Clock::time_point::max();
   }
   if (Clock::now() < filters_.GetNext()) {

@@ -39,7 +39,9 @@ private:
   UniqueFd changes_;                        // inotify(7)
   std::vector<UniqueFd> watched_;           // of the daemons that run
   std::map<std::string, BackOff> backOffs_; // by the daemon's name
-  BackOff filters_;
+  // Asking costs nothing, and a hostapd that goes on may first do what it was last told, and be open.
+  static constexpr std::chrono::seconds kLongestSilence{4};
+  BackOff filters_{kLongestSilence};
 };
 
 } // namespace vornhost

@@ -158,7 +158,7 @@ std::vector<OldNetwork> TellOldFilter(std::vector<OldNetwork> networks) {
   for (const OldNetwork &old : networks) {
     const char *left =
         isRestored(old, last, TellPolicy) ? "the old policy without its lists" : "a part of a MAC filter";
-    LogError("%s: hostapd has %s until it is told again or started again", old.network->name.c_str(), left);
+    LogError("%s: hostapd has %s until it answers and is told again", old.network->name.c_str(), left);
   }
   return networks;
 }

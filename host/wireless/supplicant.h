@@ -21,8 +21,8 @@ public:
 
   bool IsRunning() const { return process_.IsRunning(); }
 
-  /// As DaemonProcess's.
-  UniqueFd Watch() const { return process_.Watch(); }
+  /// As DaemonProcess's, of the one at that interface: of two adapters one may have taken the other's place.
+  UniqueFd Watch(const std::string &interface) const { return process_.Watch("-i", interface); }
 
   /// Starts it with the interface's configuration; from then on it joins the network whenever that is there. Throws
   /// std::runtime_error when it cannot be started.

@@ -125,7 +125,7 @@ TEST_F(WifiApplyFailure, SilenceInTheMiddleLeavesTheOldPolicyInForce) {
         << policy;
     EXPECT_EQ(Picture(), before);
     EXPECT_THAT(TakeLogLines(),
-                ElementsAre("3 wlan0: hostapd has the old policy without its lists until it is told again or started "
+                ElementsAre("3 wlan0: hostapd has the old policy without its lists until it answers and is told "
                             "again",
                             "3 wlan0: wlan0: hostapd does not take the MAC filter"));
   }
