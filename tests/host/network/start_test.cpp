@@ -157,6 +157,15 @@ TEST_F(DhcpScript, SetsAddressRouteAndNameServers) {
             "search home.arpa\nnameserver 10.9.0.1\nnameserver 10.9.0.3\nnameserver 203.0.113.1\n");
 }
 
+TEST_F(DhcpScript, NameServersOfAWayOutThatWasLeftAreNotAsked) {
+  Shell("ip link set lan1 nomaster && ip address add 10.78.0.5/24 dev lan2");
+  WriteFile("/run/vorn/lease.gone", "ip=10.76.0.5\nrouter=\ndns=10.76.0.1\n"); // no such interface
+  WriteFile("/run/vorn/lease.br0", "ip=10.77.0.5\nrouter=\ndns=10.77.0.1\n");
+  WriteFile("/run/vorn/lease.lan2", "ip=10.78.0.5\nrouter=\ndns=10.78.0.1\n");
+  EXPECT_EQ(Event("bound", "ip=10.9.0.5 mask=16 dns=10.9.0.1"), 0);
+  EXPECT_EQ(ReadFile("/etc/resolv.conf"), "nameserver 10.9.0.1\nnameserver 203.0.113.1\nnameserver 10.78.0.1\n");
+}
+
 TEST_F(DhcpScript, NewLeaseReplacesTheOldOneAndNothingElse) {
   Shell("ip link set lan1 nomaster && ip address add 10.77.0.1/24 dev lan1");
   EXPECT_EQ(Event("bound", "ip=10.9.0.5 mask=16"), 0);
