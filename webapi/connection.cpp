@@ -200,7 +200,12 @@ void Connection::OnSlot(bool admitted) {
 void Connection::Call() {
   Outcome outcome = [this] {
     const Runners::Inside inside(shared_.runners);
-    return session_.Call();
+    try {
+      return session_.Call();
+    } catch (...) { // no memory to say what is wrong: a turn that is not given back would shut the API for ever
+      shared_.gate.Leave(turn_);
+      throw;
+    }
   }();
   if (session_.BodySize() > kLargeBody) {
     shared_.sawLargeBody = true;
