@@ -83,7 +83,8 @@ function Side({ current }: { current: string }): JSX.Element {
   const texts = t();
   useEffect(() => {
     // On a telephone the links are a row that moves sideways. Another language makes them wider or narrower.
-    bringIntoSight(links.current?.querySelector('[aria-current]'), arrived.current && !lessMotion());
+    const row = links.current;
+    if (row) bringIntoSight(row, row.querySelector('[aria-current]'), arrived.current && !lessMotion());
     arrived.current = true;
   }, [current, texts]);
   return (
