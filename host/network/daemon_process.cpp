@@ -94,7 +94,14 @@ bool DaemonProcess::IsIt(int pid) const {
          IsInOurNetwork(pid);
 }
 
+// One that goes into the background while the list of processes is read is missed: the old number is gone by the time
+// it is looked at, and the new one was not there when the list was made. It does so once.
 std::vector<int> DaemonProcess::Find() const {
+  std::vector<int> found = FindInOneLook();
+  return found.empty() ? FindInOneLook() : found;
+}
+
+std::vector<int> DaemonProcess::FindInOneLook() const {
   std::vector<int> out;
   std::error_code failed;
   for (fs::directory_iterator entry("/proc", failed), end; !failed && entry != end; entry.increment(failed)) {

@@ -35,6 +35,7 @@ public:
 
 private:
   std::vector<int> Find() const;
+  std::vector<int> FindInOneLook() const;
   bool IsIt(int pid) const;
 
   std::string program_;

@@ -1,0 +1,49 @@
+#include "host/network/daemon_process.h"
+
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+
+#include <random>
+#include <string>
+#include <unistd.h>
+
+namespace {
+
+constexpr char kPidFile[] = "/tmp/daemon.pid";
+
+// @return its process in the foreground, which ends when it goes into the background
+pid_t StartDaemon(const std::string &microseconds) {
+  const pid_t child = fork();
+  if (child == 0) {
+    execl(DAEMON_PROGRAM, "daemon", "-P", kPidFile, microseconds.c_str(), nullptr);
+    _exit(1);
+  }
+  return child;
+}
+
+// The one that is stopped may be about to go into the background, with another number.
+TEST(DaemonProcess, OneOnItsWayIntoTheBackgroundIsStopped) {
+  constexpr int kRounds = 300;
+  const vornhost::DaemonProcess daemon("daemon", "-P", kPidFile);
+  std::mt19937 random(1); // NOLINT(cert-msc51-cpp): the same times in every run
+  for (int round = 0; round < kRounds; ++round) {
+    const pid_t child = StartDaemon(std::to_string(random() % 4000));
+    usleep(300 + static_cast<useconds_t>(random() % 4000)); // at any moment of its
+    daemon.Stop();
+    waitpid(child, nullptr, 0);
+    ASSERT_FALSE(daemon.IsRunning()) << "round " << round;
+  }
+}
+
+TEST(DaemonProcess, OnlyTheOneWithTheOptionIsWatched) {
+  const vornhost::DaemonProcess daemon("daemon", "-P", kPidFile);
+  const pid_t child = StartDaemon("0");
+  daemon.AwaitBackground();
+  EXPECT_TRUE(daemon.Watch("-P", kPidFile).IsOpen());
+  EXPECT_FALSE(daemon.Watch("-i", "wlan1").IsOpen());
+  daemon.Stop();
+  EXPECT_FALSE(daemon.Watch().IsOpen());
+  waitpid(child, nullptr, 0);
+}
+
+} // namespace
