@@ -149,10 +149,12 @@ Outcome Service::Call(const Route &route, const Caller &caller, const Peer &peer
 Outcome Service::CallOwn(const Decision &decision, const Peer &peer, const RequestHead &head, const std::string &body) {
   try {
     Json::Value parameters;
+    const Caller *caller = decision.caller ? &*decision.caller : nullptr;
     if (const char *fault = ReadParameters(body, json_, parameters)) {
+      Log(LogKind::kRefusedRequest, "%s from %s sent a call of the server's own: refused with 400, %s",
+          caller == nullptr ? "nobody" : caller->User().c_str(), peer.from.c_str(), fault);
       return {BadBody(fault), {}};
     }
-    const Caller *caller = decision.caller ? &*decision.caller : nullptr;
     if (caller != nullptr && !access_.Stands(*caller)) {
       return {NotLoggedIn(), {}};
     }

@@ -67,6 +67,9 @@ TEST_F(LogTest, AChangingCallIsALineOfWhoWhenceWhatAndItsOutcome) {
   Send("VORN.Test.Callback/1/set", person.Fields(), "{");
   EXPECT_TRUE(
       server_.LogShows("admin from 127.0.0.1 called VORN.Test.Callback v1 set: refused with 400, body is not JSON\n"));
+  Send("login", "", "{");
+  EXPECT_TRUE(
+      server_.LogShows("nobody from 127.0.0.1 sent a call of the server's own: refused with 400, body is not JSON\n"));
 }
 
 TEST_F(LogTest, NoSecretIsEverInIt) {
