@@ -7,6 +7,7 @@ set -uo pipefail
 root=$(cd "${BASH_SOURCE[0]%/*}/../.." && pwd -P)
 . "$root/lab/lib/state.sh"
 . "$root/lab/lib/look.sh"
+. "$root/tests/support/check.sh"
 
 if [ "$(id -u)" != 0 ]; then
   echo "SKIP: network namespaces need root"
@@ -14,7 +15,6 @@ if [ "$(id -u)" != 0 ]; then
 fi
 
 build=${VORN_BUILD:?"set VORN_BUILD to the build folder"}
-failures=0
 homes=()
 
 # Chooses the home that the other functions speak of; every one is taken down at the end.
@@ -38,17 +38,6 @@ take_all_down() {
 }
 trap take_all_down EXIT
 trap 'exit 130' INT TERM
-
-check() { # DESCRIPTION COMMAND...
-  local description=$1
-  shift
-  if "$@"; then
-    echo "PASS $description"
-  else
-    echo "FAIL $description"
-    failures=$((failures + 1))
-  fi
-}
 
 # What a test cannot go on without.
 need() { # DESCRIPTION COMMAND...

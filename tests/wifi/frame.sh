@@ -8,8 +8,8 @@ export PATH=/usr/sbin:/usr/bin:/sbin:/bin LC_ALL=C
 root=$(cd "${BASH_SOURCE[0]%/*}/../.." && pwd -P)
 build=${VORN_BUILD:?}
 api=127.0.0.1:8080
-failures=0
 . "$root/lab/lib/look.sh"
+. "$root/tests/support/check.sh"
 . "$root/tests/wifi/radio.sh"
 . "$root/tests/wifi/outside.sh"
 
@@ -18,17 +18,6 @@ mkfifo /run/nobody
 exec {nobody}<>/run/nobody
 sleep() { # SECONDS
   read -r -t "$1" -u "$nobody" || true
-}
-
-check() { # DESCRIPTION COMMAND...
-  local description=$1
-  shift
-  if "$@"; then
-    echo "PASS $description"
-  else
-    echo "FAIL $description"
-    failures=$((failures + 1))
-  fi
 }
 
 need() { # as check; without it nothing that follows makes sense
