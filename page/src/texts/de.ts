@@ -1,3 +1,4 @@
+// German, in one file as English is: see there.
 import type { Texts } from './en';
 
 export const de: Texts = {
